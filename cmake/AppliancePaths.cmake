@@ -1,0 +1,19 @@
+# Every fixed path of the appliance is FILEINDEX_ROOT followed by its appliance location. They are
+# written once, into one generated header, and nowhere else.
+set(FILEINDEX_GENERATED_DIR ${CMAKE_BINARY_DIR}/generated)
+
+string(REGEX REPLACE "/+$" "" FILEINDEX_ROOT_CLEAN "${FILEINDEX_ROOT}")
+if(NOT FILEINDEX_ROOT_CLEAN STREQUAL "" AND NOT FILEINDEX_ROOT_CLEAN MATCHES "^/")
+  message(FATAL_ERROR "FILEINDEX_ROOT must be an absolute path, got '${FILEINDEX_ROOT}'")
+endif()
+
+set(FILEINDEX_DAEMON_SOCKET "${FILEINDEX_ROOT_CLEAN}/var/run/fileindexd.sock")
+string(LENGTH "${FILEINDEX_DAEMON_SOCKET}" _socket_length)
+# sun_path holds 108 bytes, the terminating NUL included.
+if(_socket_length GREATER 107)
+  message(FATAL_ERROR
+    "FILEINDEX_ROOT '${FILEINDEX_ROOT_CLEAN}' makes the daemon socket path ${_socket_length} bytes long; "
+    "a Unix socket address holds at most 107. Choose a shorter FILEINDEX_ROOT.")
+endif()
+
+configure_file(${CMAKE_CURRENT_LIST_DIR}/appliance_paths.h.in ${FILEINDEX_GENERATED_DIR}/appliance_paths.h @ONLY)

@@ -1,0 +1,86 @@
+#include "fileindex/config.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+
+#include "config/json_io.h"
+#include "config/log.h"
+#include "fileindex/error.h"
+#include "fileindex/utils.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+constexpr int kLockAttempts = 3;
+}
+
+Config::Config() : m_jsConfig(Json::objectValue), m_fdLock(-1) {}
+
+Config::~Config() = default;
+
+bool Config::Lock(bool exclusive)
+{
+    const int operation = (exclusive ? LOCK_EX : LOCK_SH) | LOCK_NB;
+    for (int attempts = kLockAttempts; attempts > 0;) {
+        // Each attempt opens the lock file afresh; the descriptor of a failed attempt stays open.
+        m_fdLock = open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644);
+        if (m_fdLock < 0) {
+            break;
+        }
+        if (flock(m_fdLock, operation) == 0) {
+            return true;
+        }
+        if (errno != EINTR && errno != EAGAIN) {
+            break;
+        }
+        usleep(static_cast<useconds_t>((rand() % 10) * 1000));
+        --attempts;
+    }
+    FILEIDX_LOG("%s:%d Failed to lock folder");
+    ErrorHandler::SetError(FILEIDX_ERR_LOCK);
+    return false;
+}
+
+void Config::Unlock()
+{
+    if (m_fdLock < 0) {
+        return;
+    }
+    flock(m_fdLock, LOCK_UN);
+    close(m_fdLock);
+}
+
+bool Config::LoadJson()
+{
+    if (!IsFileExist(GetPath())) {
+        return true;
+    }
+    if (fromFile(m_jsConfig, GetPath())) {
+        return true;
+    }
+    FILEIDX_LOG("%s:%d Failed to load json from %s", GetPath().c_str());
+    ErrorHandler::SetError(FILEIDX_ERR_LOAD_CONFIG);
+    return false;
+}
+
+bool Config::SaveJson()
+{
+    if (!toFile(m_jsConfig, GetPath())) {
+        FILEIDX_LOG("%s:%d Failed to save json to %s", GetPath().c_str());
+        ErrorHandler::SetError(FILEIDX_ERR_SAVE_CONFIG);
+        return false;
+    }
+    if (chmod(GetPath().c_str(), 0644) == -1) {
+        FILEIDX_LOG("%s:%d chmod failed, path=%s", GetPath().c_str());
+    }
+    return true;
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO

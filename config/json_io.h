@@ -1,0 +1,31 @@
+// Whole-document operations on Json::Value, used for every file, frame, record and log argument.
+//
+// Reading is strict JSON text (RFC 8259): any value at the top level, no comments, nothing but
+// white space after the value. Bytes inside strings are kept as they are, valid UTF-8 or not.
+// Writing is compact, on one line, with string bytes copied raw, so a value read back from what
+// toString wrote equals the original byte for byte.
+#ifndef FILEINDEX_CONFIG_JSON_IO_H
+#define FILEINDEX_CONFIG_JSON_IO_H
+
+#include <string>
+
+#include <json/value.h>
+
+namespace VEXO {
+namespace FILEINDEX {
+
+// Parses text into value. False on anything but one strict JSON text; value is then unspecified.
+bool fromString(Json::Value &value, const std::string &text);
+// Compact one-line text of value, without a trailing newline.
+std::string toString(const Json::Value &value);
+
+// Reads and parses a whole file. False when it cannot be read or does not parse.
+bool fromFile(Json::Value &value, const std::string &path);
+// Replaces the file with toString(value) atomically (see atomic_file.h). False when it cannot be
+// written; the previous file is then left as it was.
+bool toFile(const Json::Value &value, const std::string &path);
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+#endif

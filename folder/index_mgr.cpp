@@ -1,0 +1,22 @@
+#include "fileindex/index_mgr.h"
+
+#include "config/unlock_on_return.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+bool IndexMgr::List(std::vector<Folder> &out)
+{
+    Folders folders;
+    return folders.Load() && folders.List(out);
+}
+
+bool IndexMgr::Get(Json::Value &out, const std::string &path)
+{
+    Folders folders;
+    UnlockOnReturn unlock(folders);
+    return folders.Lock(true) && folders.Load() && folders.Get(out, path);
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO

@@ -1,0 +1,60 @@
+// Config: a JSON document kept in one file and guarded by an advisory lock on a second file.
+//
+// A Config lives for one call: construct it on the stack, optionally Lock(true), Load(), change,
+// Save(), Unlock(). Destructors never unlock; a caller that locked calls Unlock itself (the system
+// drops the lock when the process closes the descriptor or exits).
+#ifndef FILEINDEX_CONFIG_H
+#define FILEINDEX_CONFIG_H
+
+#include <string>
+
+#include <json/value.h>
+
+#include "fileindex/export.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+class FILEINDEX_EXPORT Config {
+public:
+    Config();
+    virtual ~Config();
+
+    // Reads the document file and builds the subclass's view of it.
+    virtual bool Load() = 0;
+    // Rebuilds the document from the subclass's view and writes it.
+    virtual bool Save() = 0;
+    // Absolute path of the lock file.
+    virtual std::string GetLockPath() const = 0;
+    // Absolute path of the document file.
+    virtual std::string GetPath() const = 0;
+
+    // Takes the flock lock on GetLockPath(), exclusive or shared, creating the lock file (mode 0644)
+    // on first use. Never blocks: up to three attempts with a random 0-9 ms sleep between them.
+    // Fails at once when the lock file cannot be opened or flock fails otherwise.
+    // Failure: false, error 9 (FILEIDX_ERR_LOCK), "Failed to lock folder" (for either document);
+    // the last descriptor opened stays open until Unlock.
+    bool Lock(bool exclusive);
+    // Releases the lock and closes its descriptor. Harmless on an object that never locked and
+    // after a failed Lock, whose descriptor it closes.
+    void Unlock();
+
+    // Reads GetPath() into the document. A missing file (or anything but a regular file) is the
+    // first-run state: true, document unchanged. An unreadable or unparsable file: false, error 6
+    // (FILEIDX_ERR_LOAD_CONFIG), "Failed to load json from <path>".
+    bool LoadJson();
+    // Replaces GetPath() with the document atomically, then sets mode 0644. A write failure leaves
+    // the previous file: false, error 7 (FILEIDX_ERR_SAVE_CONFIG), "Failed to save json to <path>".
+    // A failed chmod only logs "chmod failed, path=<path>" and still counts as saved.
+    // Does not check that the lock is held.
+    bool SaveJson();
+
+protected:
+    Json::Value m_jsConfig;
+    int m_fdLock;
+};
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+#endif

@@ -1,0 +1,82 @@
+// Free functions of libfileindex: paths, shares and JSON members.
+//
+// A share-relative path is "/" + share name + path inside the share (/photo/holiday); a full path is
+// the file-system path, volume first (/volume1/photo/holiday). Strings are byte strings: nothing
+// here folds case or normalises Unicode.
+#ifndef FILEINDEX_UTILS_H
+#define FILEINDEX_UTILS_H
+
+#include <string>
+
+#include <json/value.h>
+
+#include "fileindex/export.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+// Cuts the share name out of a share-relative path: the text after the first character up to the
+// next "/". The first character is skipped unexamined, so "photo/x" gives "hoto" and "/" gives "".
+// False only for an empty path; share is written only on success.
+FILEINDEX_EXPORT bool GetShareNameByPath(std::string &share, const std::string &path);
+
+// Resolves a share-relative path through the share database: the volume holding the share followed
+// by the path exactly as given (letter case and slashes kept).
+// Failures: empty path logs "GetShareNameByPath failed, path=<path>" and sets no error code;
+// unknown share sets error 2 (FILEIDX_ERR_PATH) and logs nothing.
+FILEINDEX_EXPORT bool GetFullPath(std::string &fullPath, const std::string &path);
+
+// Finds the share holding a full path. Failure: false, error 2 (FILEIDX_ERR_PATH),
+// "VEXOShareNamePathGet failed, path=<path>"; the outputs are untouched.
+FILEINDEX_EXPORT bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath, const std::string &fullPath);
+
+// Replaces the first component of a share-relative path: ("/old/a", "new") gives "/new/a". The
+// result always begins with "/"; an empty path gives "".
+FILEINDEX_EXPORT std::string ReplaceShareName(const std::string &path, const std::string &share);
+
+// Plain byte-wise prefix test; callers that need component boundaries append "/" to both sides.
+FILEINDEX_EXPORT bool StringStartWith(const std::string &text, const std::string &prefix);
+
+// True when lstat succeeds and the entry is a directory (respectively a regular file); a symbolic
+// link is neither.
+FILEINDEX_EXPORT bool IsDirExist(const std::string &path);
+FILEINDEX_EXPORT bool IsFileExist(const std::string &path);
+
+// Copy object[key] into value when object is an object whose member key is exactly a string
+// (respectively a boolean); otherwise false and value untouched. No conversions.
+FILEINDEX_EXPORT bool RetrieveStringFromJsonObj(std::string &value, const std::string &key, const Json::Value &object);
+FILEINDEX_EXPORT bool RetrieveBoolFromJsonObj(bool &value, const std::string &key, const Json::Value &object);
+
+// ---- Telling the indexing daemon ----
+
+// Sends {"type": type, "data": data} to fileindexd over "/var/run/fileindexd.sock": one connection,
+// one frame (4-byte length in host byte order counting the terminating NUL, the compact JSON text,
+// the NUL), never answered. True when the whole frame was written. Never waits for a daemon that
+// is not there: no listener is false at once; a stalled one gets 1 s per write. Ignores SIGPIPE
+// process-wide from the first call on. Logs nothing and sets no error code.
+FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string &type, const Json::Value &data);
+
+// Appends {"event": event, "path": path, "data": data} as one line to the event queue of the
+// share holding the full path, under the queue's flock. True also when nothing needed writing (the
+// queue or its ".tmp" companion holds a pending reindex, 65536, of exactly this path) and when
+// another process kept the queue locked through three attempts (the event is then dropped). When
+// the event cannot be written (path outside any share, queue unknown or not openable, flock error)
+// the share ("" when unknown) is marked as needing a reindex instead, and the result is false.
+// Debug lines at LOG_LEVEL 7 only: "flock fail, ...", "try lock too many times, ...",
+// "write fail, (<written>, <length>)". A queue file it creates gets mode 0644 (less the umask).
+FILEINDEX_EXPORT bool AddCustomEvent(const int &event, const std::string &path, const Json::Value &data);
+
+// ---- Space ----
+
+// False when the share is unknown ("VEXOShareGet failed, share=...") or its volume has less than
+// 10 MiB left (the platform's quota test reporting 0x2900 or 0x2400); true otherwise, also when the
+// quota cannot be read for another reason.
+FILEINDEX_EXPORT bool IsShareSpaceEnough(const std::string &share);
+// Posts the "no space" desktop notification to the administrators through
+// "/usr/vexo/bin/vexohvxnotify". True when the tool ran successfully. Logs nothing.
+FILEINDEX_EXPORT bool NotifyNoSpace();
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+#endif

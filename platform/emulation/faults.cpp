@@ -1,0 +1,157 @@
+#include "faults.h"
+
+#include <cerrno>
+#include <map>
+#include <string>
+#include <vector>
+
+#include <json/value.h>
+
+#include "error_state_internal.h"
+#include "state_dir.h"
+
+namespace VEXO {
+namespace EMULATION {
+namespace {
+
+struct FaultRule {
+    std::optional<std::string> match;
+    std::optional<int> result;
+    std::optional<int> error;
+    std::string file = "emulation";
+    int line = 0;
+};
+
+using FaultTable = std::map<std::string, std::vector<FaultRule>>;
+
+bool IntOf(const Json::Value &value, int &out)
+{
+    if (value.isBool()) {
+        out = value.asBool() ? 1 : 0;
+        return true;
+    }
+    if ((value.type() == Json::intValue || value.type() == Json::uintValue) && value.isInt()) {
+        out = value.asInt();
+        return true;
+    }
+    return false;
+}
+
+// A rule with a member of the wrong type is left out, as if it were not there.
+bool ParseRule(const Json::Value &json, FaultRule &rule)
+{
+    if (!json.isObject()) {
+        return false;
+    }
+    if (json.isMember("match")) {
+        if (!json["match"].isString()) {
+            return false;
+        }
+        rule.match = json["match"].asString();
+    }
+    int number = 0;
+    if (json.isMember("result")) {
+        if (!IntOf(json["result"], number)) {
+            return false;
+        }
+        rule.result = number;
+    }
+    if (json.isMember("error")) {
+        if (!IntOf(json["error"], number)) {
+            return false;
+        }
+        rule.error = number;
+    }
+    if (json.isMember("file")) {
+        if (!json["file"].isString()) {
+            return false;
+        }
+        rule.file = json["file"].asString();
+    }
+    if (json.isMember("line")) {
+        if (!IntOf(json["line"], rule.line)) {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool ParseFaults(const Json::Value &json, FaultTable &table)
+{
+    if (!json.isObject()) {
+        return json.isNull();
+    }
+    for (const std::string &op : json.getMemberNames()) {
+        const Json::Value &rules = json[op];
+        std::vector<FaultRule> &parsed = table[op];
+        if (rules.isArray()) {
+            for (const Json::Value &rule : rules) {
+                FaultRule one;
+                if (ParseRule(rule, one)) {
+                    parsed.push_back(std::move(one));
+                }
+            }
+        } else {
+            FaultRule one;
+            if (ParseRule(rules, one)) {
+                parsed.push_back(std::move(one));
+            }
+        }
+    }
+    return true;
+}
+
+const FaultRule *FindRule(const FaultTable &table, const char *op, const char *matchText, bool needsResult)
+{
+    const auto found = table.find(op);
+    if (found == table.end()) {
+        return nullptr;
+    }
+    for (const FaultRule &rule : found->second) {
+        if (needsResult && !rule.result) {
+            continue;
+        }
+        if (rule.match && (matchText == nullptr || *rule.match != matchText)) {
+            continue;
+        }
+        return &rule;
+    }
+    return nullptr;
+}
+
+// Applies the first rule that matches: sets its error, if it names one, and returns it.
+const FaultRule *ApplyRule(const char *op, const char *matchText, bool needsResult,
+                           std::shared_ptr<const FaultTable> &holder)
+{
+    static CachedStateFile<FaultTable> faults("faults.json", ParseFaults);
+    // Reading the rules must not disturb errno or the error state of the call it belongs to.
+    const int savedErrno = errno;
+    holder = faults.Get();
+    errno = savedErrno;
+    if (holder == nullptr) {
+        return nullptr;  // a faults.json that does not parse forces nothing
+    }
+    const FaultRule *rule = FindRule(*holder, op, matchText, needsResult);
+    if (rule != nullptr && rule->error) {
+        SetPlatformError(*rule->error, rule->file.c_str(), rule->line);
+    }
+    return rule;
+}
+
+}  // namespace
+
+std::optional<int> ForcedResult(const char *op, const char *matchText)
+{
+    std::shared_ptr<const FaultTable> holder;
+    const FaultRule *rule = ApplyRule(op, matchText, true, holder);
+    return rule != nullptr ? rule->result : std::nullopt;
+}
+
+bool ForcedFailure(const char *op, const char *matchText)
+{
+    std::shared_ptr<const FaultTable> holder;
+    return ApplyRule(op, matchText, false, holder) != nullptr;
+}
+
+}  // namespace EMULATION
+}  // namespace VEXO

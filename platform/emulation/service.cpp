@@ -1,0 +1,276 @@
+// Services and the SMB Spotlight switch: services.json records what runs, service_commands.json
+// what to launch, smb.json the switch.
+#include "platform/service.h"
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "api.h"
+#include "faults.h"
+#include "journal.h"
+#include "json_text.h"
+#include "process.h"
+#include "state_dir.h"
+
+namespace VEXO {
+namespace EMULATION {
+namespace {
+
+using CommandTable = Json::Value;
+
+bool ParseCommands(const Json::Value &json, CommandTable &commands)
+{
+    if (!json.isObject() && !json.isNull()) {
+        return false;
+    }
+    commands = json;
+    return true;
+}
+
+bool ParseSpotlight(const Json::Value &json, bool &spotlight)
+{
+    if (json.isNull()) {
+        spotlight = false;
+        return true;
+    }
+    if (!json.isObject() || (json.isMember("spotlight") && !json["spotlight"].isBool())) {
+        return false;
+    }
+    spotlight = json.get("spotlight", false).asBool();
+    return true;
+}
+
+// The command of a service: absent (an empty vector), or an array of strings with the program's
+// path first. False when service_commands.json or the service's entry is malformed.
+bool CommandOf(const std::string &service, std::vector<std::string> &command)
+{
+    static CachedStateFile<CommandTable> commands("service_commands.json", ParseCommands);
+    const std::shared_ptr<const CommandTable> table = commands.Get();
+    if (table == nullptr) {
+        return false;
+    }
+    if (!table->isMember(service)) {
+        return true;
+    }
+    const Json::Value &entry = (*table)[service];
+    if (!entry.isArray() || entry.empty()) {
+        return false;
+    }
+    for (const Json::Value &arg : entry) {
+        if (!arg.isString()) {
+            return false;
+        }
+        command.push_back(arg.asString());
+    }
+    return true;
+}
+
+LaunchedProcess ProcessOf(const Json::Value &entry)
+{
+    LaunchedProcess process;
+    if (entry["pid"].isInt()) {
+        process.pid = entry["pid"].asInt();
+    }
+    if (entry["started"].isUInt64()) {
+        process.startTime = entry["started"].asUInt64();
+    }
+    return process;
+}
+
+bool RecordedRunning(const Json::Value &entry)
+{
+    return entry.isObject() && entry["running"].isBool() && entry["running"].asBool();
+}
+
+// A service runs while its entry says so and, when it has a process, that process is alive.
+bool IsRunning(const Json::Value &entry)
+{
+    return RecordedRunning(entry) && (!entry.isMember("pid") || ProcessAlive(ProcessOf(entry)));
+}
+
+// services.json read under the lock; false (with the error state set) when it cannot be used.
+bool ReadServices(Json::Value &services)
+{
+    switch (ReadJsonFile(StatePath("services.json"), services)) {
+    case ReadStatus::kMissing:
+        services = Json::Value(Json::objectValue);
+        return true;
+    case ReadStatus::kRead:
+        if (services.isObject()) {
+            return true;
+        }
+        break;
+    case ReadStatus::kBad:
+        break;
+    }
+    EMU_SET_ERROR(kErrStateFile);
+    return false;
+}
+
+int StopLocked(Json::Value &services, const std::string &name)
+{
+    const Json::Value &entry = services[name];
+    if (entry.isMember("pid") && !TerminateProcess(ProcessOf(entry))) {
+        EMU_SET_ERROR(kErrCannotRun);
+        return -1;
+    }
+    Json::Value stopped(Json::objectValue);
+    stopped["running"] = false;
+    services[name] = stopped;
+    return 0;
+}
+
+int StartLocked(Json::Value &services, const std::string &name)
+{
+    std::vector<std::string> command;
+    if (!CommandOf(name, command)) {
+        EMU_SET_ERROR(kErrStateFile);
+        return -1;
+    }
+    Json::Value entry(Json::objectValue);
+    entry["running"] = true;
+    if (!command.empty()) {
+        LaunchedProcess process;
+        if (!LaunchDetached(command, process)) {
+            EMU_SET_ERROR(kErrCannotRun);
+            return -1;
+        }
+        entry["pid"] = process.pid;
+        if (process.startTime != 0) {
+            entry["started"] = Json::UInt64(process.startTime);
+        }
+    }
+    services[name] = entry;
+    return 0;
+}
+
+enum class ServiceAction { kStart, kStop, kRestart };
+
+int ChangeService(const char *op, ServiceAction action, const char *service, std::optional<int> flags)
+{
+    Json::Value args(Json::arrayValue);
+    args.append(TextValue(service));
+    if (flags) {
+        args.append(*flags);
+    }
+    if (const std::optional<int> forced = ForcedResult(op, service)) {
+        JournalCall(op, args, *forced, true);
+        return *forced;
+    }
+    const int result = [&] {
+        if (service == nullptr || *service == '\0') {
+            EMU_SET_ERROR(kErrBadArgument);
+            return -1;
+        }
+        StateLock lock;
+        Json::Value services;
+        if (!lock.Held()) {
+            EMU_SET_ERROR(kErrStateFile);
+            return -1;
+        }
+        if (!ReadServices(services)) {
+            return -1;
+        }
+        const std::string name = service;
+        const Json::Value entry = services.get(name, Json::Value());
+        const bool running = IsRunning(entry);
+        int outcome = 0;
+        bool changed = false;
+        // A record that says running with its process gone is stopped too: only the record changes.
+        if (action != ServiceAction::kStart && RecordedRunning(entry)) {
+            outcome = StopLocked(services, name);
+            changed = outcome == 0;
+        }
+        const bool starts = action == ServiceAction::kRestart || (action == ServiceAction::kStart && !running);
+        if (outcome == 0 && starts) {
+            outcome = StartLocked(services, name);
+            changed = changed || outcome == 0;
+        }
+        if (changed && !ReplaceJsonFile(StatePath("services.json"), services)) {
+            if (starts && outcome == 0) {
+                TerminateProcess(ProcessOf(services[name]));  // unrecorded, it could never be stopped
+            }
+            EMU_SET_ERROR(kErrStateFile);
+            return -1;
+        }
+        return outcome;
+    }();
+    JournalCall(op, args, result, false);
+    return result;
+}
+
+}  // namespace
+}  // namespace EMULATION
+}  // namespace VEXO
+
+using namespace VEXO::EMULATION;
+
+extern "C" VEXOEMU_API int VLIBServiceStart(const char *szService, int flags)
+{
+    return Guarded(-1, [&] { return ChangeService("VLIBServiceStart", ServiceAction::kStart, szService, flags); });
+}
+
+extern "C" VEXOEMU_API int VLIBServiceStop(const char *szService, int flags)
+{
+    return Guarded(-1, [&] { return ChangeService("VLIBServiceStop", ServiceAction::kStop, szService, flags); });
+}
+
+extern "C" VEXOEMU_API int VLIBServiceRestart(const char *szService)
+{
+    return Guarded(-1, [&] {
+        return ChangeService("VLIBServiceRestart", ServiceAction::kRestart, szService, std::nullopt);
+    });
+}
+
+extern "C" VEXOEMU_API int VEXOSMBIsEnableSpotlight(void)
+{
+    return Guarded(0, [&] {
+        if (const std::optional<int> forced = ForcedResult("VEXOSMBIsEnableSpotlight", nullptr)) {
+            return *forced;
+        }
+        static CachedStateFile<bool> smb("smb.json", ParseSpotlight);
+        const std::shared_ptr<const bool> spotlight = smb.Get();
+        if (spotlight == nullptr) {
+            EMU_SET_ERROR(kErrStateFile);
+            return 0;
+        }
+        return *spotlight ? 1 : 0;
+    });
+}
+
+extern "C" VEXOEMU_API int VEXOSMBSetSpotlight(int enable)
+{
+    return Guarded(-1, [&] {
+        Json::Value args(Json::arrayValue);
+        args.append(enable);
+        if (const std::optional<int> forced = ForcedResult("VEXOSMBSetSpotlight", nullptr)) {
+            JournalCall("VEXOSMBSetSpotlight", args, *forced, true);
+            return *forced;
+        }
+        const int result = [&] {
+            StateLock lock;
+            if (!lock.Held()) {
+                EMU_SET_ERROR(kErrStateFile);
+                return -1;
+            }
+            const std::string path = StatePath("smb.json");
+            Json::Value smb;
+            const ReadStatus status = ReadJsonFile(path, smb);
+            if (status == ReadStatus::kMissing) {
+                smb = Json::Value(Json::objectValue);
+            } else if (status == ReadStatus::kBad || !smb.isObject()) {
+                EMU_SET_ERROR(kErrStateFile);
+                return -1;
+            }
+            smb["spotlight"] = enable != 0;  // other members stay as they are
+            if (!ReplaceJsonFile(path, smb)) {
+                EMU_SET_ERROR(kErrStateFile);
+                return -1;
+            }
+            return 0;
+        }();
+        JournalCall("VEXOSMBSetSpotlight", args, result, false);
+        return result;
+    });
+}

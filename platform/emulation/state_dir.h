@@ -1,0 +1,116 @@
+// The emulation's state directory: where its files are, the lock that serialises read-modify-write
+// cycles across processes, whole-file JSON reads and atomic replaces, and a parse cache that reads a
+// file again only when it changed.
+#ifndef VEXOEMU_STATE_DIR_H
+#define VEXOEMU_STATE_DIR_H
+
+#include <sys/stat.h>
+
+#include <ctime>
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include <json/value.h>
+
+namespace VEXO {
+namespace EMULATION {
+
+// "<state directory>/<fileName>".
+std::string StatePath(const char *fileName);
+
+// Exclusive hold of state.lock for the lifetime of the object. The directory must exist: the
+// emulation never creates it.
+class StateLock {
+public:
+    StateLock();
+    ~StateLock();
+    StateLock(const StateLock &) = delete;
+    StateLock &operator=(const StateLock &) = delete;
+
+    bool Held() const { return m_fd >= 0; }
+
+private:
+    int m_fd;
+};
+
+enum class ReadStatus { kRead, kMissing, kBad };
+
+// Reads and parses a whole file. A missing or empty file is kMissing and leaves a null value.
+ReadStatus ReadJsonFile(const std::string &path, Json::Value &value);
+// Replaces the file with the value's compact text through a temporary file and a rename, so that
+// readers see the old or the new content and nothing in between.
+bool ReplaceJsonFile(const std::string &path, const Json::Value &value);
+
+// Identity of a file's content as far as stat tells it.
+struct FileStamp {
+    bool exists = false;
+    dev_t device = 0;
+    ino_t inode = 0;
+    off_t size = 0;
+    timespec modified = {0, 0};
+
+    bool operator==(const FileStamp &other) const;
+};
+
+// Reads the stamp of a file; false when stat fails for another reason than the file's absence.
+bool StampOf(const std::string &path, FileStamp &stamp);
+// True when a file with this stamp, read at readAt, could still change without its stamp changing
+// (time stamps are coarse: a rewrite of the same size in the same tick keeps the old time).
+bool StampIsRacy(const FileStamp &stamp, const timespec &readAt);
+
+// A state file parsed into T, read again only when its stamp changes. T comes from a parser that is
+// handed the file's JSON, null when the file is missing, and answers false when it is malformed.
+template <typename T>
+class CachedStateFile {
+public:
+    using Parser = bool (*)(const Json::Value &json, T &out);
+
+    CachedStateFile(const char *fileName, Parser parse) : m_fileName(fileName), m_parse(parse) {}
+
+    // The current content; null when the file cannot be read or is malformed.
+    std::shared_ptr<const T> Get()
+    {
+        const std::string path = StatePath(m_fileName);
+        FileStamp stamp;
+        if (!StampOf(path, stamp)) {
+            return nullptr;
+        }
+        std::lock_guard<std::mutex> guard(m_mutex);
+        if (m_loaded && !m_racy && stamp == m_stamp) {
+            return m_value;
+        }
+        timespec readAt = {0, 0};
+        clock_gettime(CLOCK_REALTIME, &readAt);
+        Json::Value json;
+        if (ReadJsonFile(path, json) == ReadStatus::kBad) {
+            m_loaded = false;
+            return nullptr;
+        }
+        auto parsed = std::make_shared<T>();
+        if (!m_parse(json, *parsed)) {
+            m_loaded = false;
+            return nullptr;
+        }
+        // The stamp taken before the read: a change during the read shows as a new stamp next time.
+        m_stamp = stamp;
+        m_racy = StampIsRacy(stamp, readAt);
+        m_value = std::move(parsed);
+        m_loaded = true;
+        return m_value;
+    }
+
+private:
+    const char *m_fileName;
+    Parser m_parse;
+    std::mutex m_mutex;
+    bool m_loaded = false;
+    bool m_racy = false;
+    FileStamp m_stamp;
+    std::shared_ptr<const T> m_value;
+};
+
+}  // namespace EMULATION
+}  // namespace VEXO
+
+#endif

@@ -1,0 +1,171 @@
+#include "fileindex/utils.h"
+
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+
+#include "config/log.h"
+#include "fileindex/error.h"
+#include "fileindex/fileidx.h"
+#include "platform/error_state.h"
+#include "platform/fs.h"
+#include "platform/share_db.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+
+constexpr int kShareNameSize = 492;
+constexpr int kSharePathSize = 4096;
+
+// Per-share storage inside the share's hidden metadata directory.
+const char kMetadataDir[] = "@eaDir";
+const char kQueueFileName[] = "VEXO@file_index_queue";
+const char kDatabaseDirName[] = "VEXO@.fileindexdb";
+constexpr int kPlatformBadParameter = 0x0D00;
+
+// Formats S/@eaDir/<name> of the share into out, making S/@eaDir (and, for the database, the final
+// directory) on the way. The length written, or -1 when the arguments are invalid or the share is
+// unknown.
+int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *outArgument, const char *name,
+                   bool makeFinalDir)
+{
+    const char *invalid = szName == nullptr ? "__null != szName"
+                          : szOut == nullptr ? outArgument
+                          : cbOutLen <= 0    ? "cbOutLen > 0"
+                                             : nullptr;
+    if (invalid != nullptr) {
+        FILEIDX_LOG("%s:%d Invaild Argument (%s)=[%d]\n", invalid, 0);
+        VLIBCErrSetEx(kPlatformBadParameter, __FILE_NAME__, __LINE__);
+        return -1;
+    }
+    PVEXOSHARE share = nullptr;
+    if (VEXOShareGet(szName, &share) < 0) {
+        FILEIDX_LOG("%s:%d VEXOShareGet failed, name=%s, code=%d", szName, VLIBCErrGet());
+        return -1;
+    }
+    char metadataDir[kSharePathSize];
+    snprintf(metadataDir, sizeof(metadataDir), "%s/%s", share->szPath, kMetadataDir);
+    if (VEXOEAMKDir(0, metadataDir) < 0) {
+        FILEIDX_LOG("%s:%d VEXOEAMKDir failed, path=%s, code=%d", metadataDir, VLIBCErrGet());
+    }
+    snprintf(szOut, static_cast<size_t>(cbOutLen), "%s/%s/%s", share->szPath, kMetadataDir, name);
+    if (makeFinalDir && mkdir(szOut, 0777) != 0 && errno != EEXIST) {
+        FILEIDX_LOG("%s:%d mkdir failed, path=%s, reason=%m", szOut);
+    }
+    VEXOShareFree(share);
+    return static_cast<int>(strlen(szOut));
+}
+
+}  // namespace
+
+// ---- Share and path resolution ----
+
+bool GetShareNameByPath(std::string &share, const std::string &path)
+{
+    if (path.empty()) {
+        return false;
+    }
+    const size_t slash = path.find('/', 1);
+    share = path.substr(1, slash == std::string::npos ? std::string::npos : slash - 1);
+    return true;
+}
+
+bool GetFullPath(std::string &fullPath, const std::string &path)
+{
+    std::string share;
+    if (!GetShareNameByPath(share, path)) {
+        FILEIDX_LOG("%s:%d GetShareNameByPath failed, path=%s", path.c_str());
+        return false;
+    }
+    PVEXOSHARE record = nullptr;
+    if (VEXOShareGet(share.c_str(), &record) < 0) {
+        ErrorHandler::SetError(FILEIDX_ERR_PATH);
+        return false;
+    }
+    const std::string sharePath = record->szPath;
+    VEXOShareFree(record);
+    const size_t lastSlash = sharePath.rfind('/');
+    fullPath = (lastSlash == std::string::npos ? sharePath : sharePath.substr(0, lastSlash)) + path;
+    return true;
+}
+
+bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath, const std::string &fullPath)
+{
+    char nameBuffer[kShareNameSize] = {};
+    char pathBuffer[kSharePathSize] = {};
+    if (VEXOShareNamePathGet(fullPath.c_str(), nameBuffer, kShareNameSize, pathBuffer, kSharePathSize) < 0) {
+        FILEIDX_LOG("%s:%d VEXOShareNamePathGet failed, path=%s", fullPath.c_str());
+        ErrorHandler::SetError(FILEIDX_ERR_PATH);
+        return false;
+    }
+    share = nameBuffer;
+    sharePath = pathBuffer;
+    return true;
+}
+
+std::string ReplaceShareName(const std::string &path, const std::string &share)
+{
+    if (path.empty()) {
+        return std::string();
+    }
+    const size_t slash = path.find('/', 1);
+    return "/" + share + (slash == std::string::npos ? std::string() : path.substr(slash));
+}
+
+bool StringStartWith(const std::string &text, const std::string &prefix)
+{
+    return text.size() >= prefix.size() && text.compare(0, prefix.size(), prefix) == 0;
+}
+
+bool IsDirExist(const std::string &path)
+{
+    struct stat64 st;
+    return lstat64(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode);
+}
+
+bool IsFileExist(const std::string &path)
+{
+    struct stat64 st;
+    return lstat64(path.c_str(), &st) == 0 && S_ISREG(st.st_mode);
+}
+
+// ---- Typed JSON members ----
+
+bool RetrieveStringFromJsonObj(std::string &value, const std::string &key, const Json::Value &object)
+{
+    if (!object.isObject() || !object.isMember(key) || !object[key].isString()) {
+        return false;
+    }
+    value = object[key].asString();
+    return true;
+}
+
+bool RetrieveBoolFromJsonObj(bool &value, const std::string &key, const Json::Value &object)
+{
+    if (!object.isObject() || !object.isMember(key) || !object[key].isBool()) {
+        return false;
+    }
+    value = object[key].asBool();
+    return true;
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+// ---- Per-share storage locations ----
+
+int FILEIDXQueuePathGet(const char *szName, char *szOutQueuePath, int cbOutLen)
+{
+    return VEXO::FILEINDEX::StoragePathGet(szName, szOutQueuePath, cbOutLen, "__null != szOutQueuePath",
+                                           VEXO::FILEINDEX::kQueueFileName, false);
+}
+
+int FILEIDXDBPathGet(const char *szName, char *szOutDBPath, int cbOutLen)
+{
+    return VEXO::FILEINDEX::StoragePathGet(szName, szOutDBPath, cbOutLen, "__null != szOutDBPath",
+                                           VEXO::FILEINDEX::kDatabaseDirName, true);
+}

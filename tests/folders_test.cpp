@@ -1,0 +1,403 @@
+// The folder list: loading, merging settings with their change reports, removing, listing, and the
+// locked lookup of IndexMgr.
+#include "fileindex/error.h"
+#include "fileindex/folder.h"
+#include "fileindex/index_mgr.h"
+#include "folder/change_report.h"
+#include "tests/support/child.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/sandbox.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace fileindex_test {
+namespace {
+
+const std::string kFolderConf = FILEINDEX_FOLDER_CONF_PATH;
+
+Json::Value Request(const std::string &text)
+{
+    return ParseJson(text);
+}
+
+Json::Value Report(bool document, bool audio, bool video, bool photo)
+{
+    Json::Value report;
+    report["document"] = document;
+    report["audio"] = audio;
+    report["video"] = video;
+    report["photo"] = photo;
+    return report;
+}
+
+Folder MakeFolder(const std::string &path, const std::string &record = "{}")
+{
+    Folder folder;
+    folder.Load(path, ParseJson(record));
+    return folder;
+}
+
+class FoldersTest : public SandboxTest {
+protected:
+    void SetUp() override
+    {
+        SandboxTest::SetUp();
+        DeclareShares("volume1/photo volume1/video volume1/video2 volume2/music");
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+    }
+
+    // Upserts into a fresh list loaded from disk and saves, as a writer would.
+    static void UpsertAndSave(const std::string &request)
+    {
+        Folders folders;
+        ASSERT_TRUE(folders.Load());
+        Json::Value report;
+        ASSERT_TRUE(folders.Upsert(report, Request(request)));
+        ASSERT_TRUE(folders.Save());
+    }
+
+    static Json::Value StoredDocument() { return ParseJson(ReadFile(kFolderConf)); }
+};
+
+TEST_F(FoldersTest, LoadMergesOnlyWellTypedKeysAndReloadStartsFromDefaults)
+{
+    Folder folder = MakeFolder("/photo/a", R"({"name":"a","video":true})");
+    EXPECT_TRUE(folder.Load("/photo/a", Request(R"({"path":"/ignored","name":5,"audio":true,"photo":1})")));
+    EXPECT_EQ(folder.m_path, "/photo/a");
+    EXPECT_EQ(folder.m_name, "a");
+    EXPECT_TRUE(folder.m_bAudio);
+    EXPECT_TRUE(folder.m_bVideo);
+    EXPECT_FALSE(folder.m_bPhoto);
+    EXPECT_EQ(folder.m_fullPath, HostPath("/volume1/photo/a"));
+
+    EXPECT_TRUE(folder.Reload("/photo/a", Json::Value(Json::objectValue)));
+    EXPECT_EQ(folder.asJson(), Request(R"({"path":"/photo/a","name":"","document":false,"audio":false,"video":false,"photo":false})"));
+    EXPECT_FALSE(folder.Reload("/gone/a", Json::Value(Json::objectValue)));
+}
+
+TEST_F(FoldersTest, FullPathOfALoadedFolderIsCachedAndAFailedOneIsLogged)
+{
+    const Folder loaded = MakeFolder("/photo/a");
+    SetFaults(Request(R"({"VEXOShareGet": {"result": -1}})"));
+    EXPECT_EQ(loaded.GetFullPath(), HostPath("/volume1/photo/a"));
+    EXPECT_TRUE(LogCapture::Lines().empty());
+
+    const Folder orphan = MakeFolder("/photo/b");
+    EXPECT_EQ(orphan.GetFullPath(), "");
+    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to get full path from /photo/b"});
+}
+
+TEST_F(FoldersTest, AddToJsonRefusesAnythingButAnObject)
+{
+    const Folder folder = MakeFolder("/photo/a");
+    Json::Value array(Json::arrayValue);
+    EXPECT_FALSE(folder.AddToJson(array));
+    EXPECT_EQ(array, Json::Value(Json::arrayValue));
+    Json::Value object(Json::objectValue);
+    object["/photo/a"] = 1;
+    EXPECT_TRUE(folder.AddToJson(object));
+    EXPECT_EQ(object["/photo/a"], folder.asJson());
+}
+
+TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
+{
+    const struct {
+        const char *content;
+        _tag_fileindex_err_ code;
+        std::string message;
+    } cases[] = {
+        {"[1,2]", FILEIDX_ERR_MALFORMED_CONFIG, "Malformed folders: [1,2]"},
+        {"\"text\"", FILEIDX_ERR_MALFORMED_CONFIG, "Malformed folders: \"text\""},
+        {"{\"/photo/a\":{\"name\":", FILEIDX_ERR_LOAD_CONFIG, "Failed to load json from " + kFolderConf},
+        {"", FILEIDX_ERR_LOAD_CONFIG, "Failed to load json from " + kFolderConf},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.content);
+        WriteFile(kFolderConf, c.content);
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        std::vector<Folder> listed(1);
+        EXPECT_FALSE(IndexMgr::List(listed));
+        EXPECT_EQ(listed.size(), 1u) << "out is untouched on failure";
+        EXPECT_EQ(ErrorHandler::GetError(), c.code);
+        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{c.message});
+    }
+}
+
+TEST_F(FoldersTest, MissingFileIsAnEmptyListAndTheFirstSaveCreatesIt)
+{
+    std::vector<Folder> listed(3);
+    ASSERT_TRUE(IndexMgr::List(listed));
+    EXPECT_TRUE(listed.empty());
+    UpsertAndSave(R"({"path":"/photo/a","name":"A","photo":true})");
+    EXPECT_EQ(StoredDocument(), Request(R"({"/photo/a":{"path":"/photo/a","name":"A","document":false,"audio":false,"video":false,"photo":true}})"));
+}
+
+TEST_F(FoldersTest, OddRecordsLoadAndAreWrittenBackAsFullRecords)
+{
+    WriteFile(kFolderConf, R"({"/photo/str":"text","/gone/x":{"path":"/elsewhere","name":"x","audio":true,"extra":1}})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    std::vector<Folder> listed;
+    ASSERT_TRUE(folders.List(listed));
+    ASSERT_EQ(listed.size(), 2u);
+    EXPECT_EQ(listed[0].m_path, "/gone/x");
+    EXPECT_EQ(listed[0].m_fullPath, "") << "a folder whose share is gone still loads";
+    EXPECT_TRUE(listed[0].m_bAudio);
+    ASSERT_TRUE(folders.Save());
+    EXPECT_EQ(StoredDocument(), Request(R"({
+        "/gone/x":{"path":"/gone/x","name":"x","document":false,"audio":true,"video":false,"photo":false},
+        "/photo/str":{"path":"/photo/str","name":"","document":false,"audio":false,"video":false,"photo":false}})"));
+}
+
+TEST_F(FoldersTest, SecondLoadKeepsTheFirstValues)
+{
+    WriteFile(kFolderConf, R"({"/photo/a":{"name":"first"}})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    WriteFile(kFolderConf, R"({"/photo/a":{"name":"second"},"/photo/b":{}})");
+    ASSERT_TRUE(folders.Load());
+    Json::Value record;
+    ASSERT_TRUE(folders.Get(record, "/photo/a"));
+    EXPECT_EQ(record["name"], "first");
+    EXPECT_TRUE(folders.Get(record, "/photo/b"));
+}
+
+TEST_F(FoldersTest, UpsertOfANewPathStartsFromDefaultsAndReportsAgainstTheGoverningSetting)
+{
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    Json::Value report;
+    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo"})")));
+    EXPECT_EQ(report, Report(true, true, true, true)) << "nothing governed the path before";
+
+    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo","photo":true,"video":true})")));
+    EXPECT_EQ(report, Report(false, false, true, true));
+
+    // An inner folder with its own settings, reported against the outer folder that governed it.
+    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/inner","photo":true,"audio":true})")));
+    EXPECT_EQ(report, Report(false, true, true, false));
+
+    Json::Value record;
+    ASSERT_TRUE(folders.Get(record, "/photo/inner"));
+    EXPECT_EQ(record, Request(R"({"path":"/photo/inner","name":"","document":false,"audio":true,"video":false,"photo":true})"));
+}
+
+TEST_F(FoldersTest, UpsertOfAStoredPathMergesAndReportsOnlyWhatChanged)
+{
+    UpsertAndSave(R"({"path":"/photo/a","name":"A","document":true,"audio":false})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    Json::Value report;
+    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/a","audio":true,"video":"yes"})")));
+    EXPECT_EQ(report, Report(false, true, false, false));
+    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/a","audio":true})")));
+    EXPECT_EQ(report, Report(false, false, false, false));
+    Json::Value record;
+    ASSERT_TRUE(folders.Get(record, "/photo/a"));
+    EXPECT_EQ(record, Request(R"({"path":"/photo/a","name":"A","document":true,"audio":true,"video":false,"photo":false})"));
+}
+
+TEST_F(FoldersTest, UpsertRefusesARequestWithoutAResolvablePath)
+{
+    UpsertAndSave(R"({"path":"/photo/a"})");
+    const std::string before = ReadFile(kFolderConf);
+    const struct {
+        const char *request;
+        std::vector<std::string> messages;
+    } cases[] = {
+        {R"({"name":"no path"})", {R"(Bad param: {"name":"no path"})"}},
+        {R"({"path":5})", {R"(Bad param: {"path":5})"}},
+        {R"(["/photo/b"])", {R"(Bad param: ["/photo/b"])"}},
+        {R"({"path":"/nosuch/b"})", {R"(Bad param: {"path":"/nosuch/b"})"}},
+        {R"({"path":""})", {"GetShareNameByPath failed, path=", R"(Bad param: {"path":""})"}},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.request);
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        Folders folders;
+        ASSERT_TRUE(folders.Load());
+        Json::Value report = "untouched";
+        EXPECT_FALSE(folders.Upsert(report, Request(c.request)));
+        EXPECT_EQ(report, "untouched");
+        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_BAD_PARAM);
+        EXPECT_EQ(LogCapture::Messages(), c.messages);
+        ASSERT_TRUE(folders.Save());
+        EXPECT_EQ(ReadFile(kFolderConf), before) << "the table was changed";
+    }
+}
+
+TEST_F(FoldersTest, TheThousandthFolderFitsAndTheNextOneDoesNot)
+{
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    Json::Value report;
+    for (int i = 0; i < 1000; ++i) {
+        ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/)" + std::to_string(i) + R"("})"))) << i;
+    }
+    ASSERT_TRUE(folders.Save());
+    EXPECT_EQ(StoredDocument().size(), 1000u);
+
+    LogCapture::Clear();
+    EXPECT_FALSE(folders.Upsert(report, Request(R"({"path":"/photo/new"})")));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_EXCEED_MAX_FOLDER);
+    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Exceed max folder size"});
+    std::vector<Folder> listed;
+    folders.List(listed);
+    EXPECT_EQ(listed.size(), 1001u) << "the refused record stays in memory; callers must not save";
+
+    Folders reloaded;
+    ASSERT_TRUE(reloaded.Load());
+    EXPECT_TRUE(reloaded.Upsert(report, Request(R"({"path":"/photo/999","audio":true})")))
+        << "changing a stored folder of a full list is still allowed";
+}
+
+TEST_F(FoldersTest, DeleteReportsKeyedByPathAndErasesEvenWhenThePathNoLongerResolves)
+{
+    WriteFile(kFolderConf, R"({"/photo":{"photo":true},"/photo/a":{"photo":true,"audio":true},"/gone/x":{}})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+
+    Json::Value report;
+    ASSERT_TRUE(folders.Delete(report, "/photo/a"));
+    Json::Value expected;
+    expected["/photo/a"] = Report(false, true, false, false);  // /photo governs it afterwards
+    EXPECT_EQ(report, expected);
+
+    ASSERT_TRUE(folders.Delete(report, "/photo/not-listed"));
+    expected = Json::Value();
+    expected["/photo/not-listed"] = Report(false, false, false, false);
+    EXPECT_EQ(report, expected);
+
+    report = "untouched";
+    ErrorHandler::SetError(FILEIDX_ERR_NONE);
+    EXPECT_TRUE(folders.Delete(report, "/gone/x"));
+    EXPECT_EQ(report, "untouched");
+    ASSERT_TRUE(folders.Save());
+    EXPECT_EQ(StoredDocument().getMemberNames(), std::vector<std::string>{"/photo"});
+}
+
+TEST_F(FoldersTest, GetMatchesThePathExactly)
+{
+    UpsertAndSave(R"({"path":"/photo/a","name":"A"})");
+    Json::Value record = "untouched";
+    EXPECT_FALSE(IndexMgr::Get(record, "/photo/a/"));
+    EXPECT_EQ(record, "untouched");
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NO_SUCH_FOLDER);
+    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"No such folder: /photo/a/"});
+    ASSERT_TRUE(IndexMgr::Get(record, "/photo/a"));
+    EXPECT_EQ(record["name"], "A");
+}
+
+TEST_F(FoldersTest, GetTakesTheFolderLockWhileListReadsWithoutIt)
+{
+    UpsertAndSave(R"({"path":"/photo/a"})");
+    LogCapture::Clear();
+    {
+        LockHolder writer(FILEINDEX_FOLDER_LOCK_PATH, true);
+        Json::Value record = "untouched";
+        EXPECT_FALSE(IndexMgr::Get(record, "/photo/a"));
+        EXPECT_EQ(record, "untouched");
+        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_LOCK);
+        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to lock folder"});
+
+        std::vector<Folder> listed;
+        EXPECT_TRUE(IndexMgr::List(listed));
+        EXPECT_EQ(listed.size(), 1u);
+    }
+    Json::Value record;
+    EXPECT_TRUE(IndexMgr::Get(record, "/photo/a")) << "Get released its lock after the failure";
+    EXPECT_TRUE(IndexMgr::Get(record, "/photo/a")) << "Get released its lock after success";
+}
+
+TEST_F(FoldersTest, ListOfOneShareComparesWholeNamesExactly)
+{
+    WriteFile(kFolderConf, R"({"/video/a":{},"/video2/b":{},"/Video/c":{},"":{},"/video":{}})");
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    std::vector<Folder> listed;
+    ASSERT_TRUE(folders.List(listed, "video"));
+    std::vector<std::string> paths;
+    for (const Folder &folder : listed) {
+        paths.push_back(folder.m_path);
+    }
+    EXPECT_EQ(paths, (std::vector<std::string>{"/video", "/video/a"}));
+
+    ASSERT_TRUE(folders.List(listed));
+    paths.clear();
+    for (const Folder &folder : listed) {
+        paths.push_back(folder.m_path);
+    }
+    EXPECT_EQ(paths, (std::vector<std::string>{"", "/Video/c", "/video", "/video/a", "/video2/b"}));
+}
+
+TEST_F(FoldersTest, GoverningSettingIsTheLastMatchInListOrderNotTheInnermost)
+{
+    const Folder outer = MakeFolder("/photo", R"({"name":"outer"})");
+    const Folder inner = MakeFolder("/photo/a", R"({"name":"inner"})");
+    const Folder sibling = MakeFolder("/photo/ab", R"({"name":"sibling"})");
+    const Folder orphan = MakeFolder("/gone", R"({"name":"orphan"})");
+    const std::string inside = HostPath("/volume1/photo/a/x");
+    const struct {
+        std::vector<Folder> folders;
+        std::string path;
+        const char *governing;  // nullptr: no setting governs
+    } cases[] = {
+        {{outer, inner}, inside, "inner"},
+        {{inner, outer}, inside, "outer"},
+        {{outer, inner}, HostPath("/volume1/photo/a"), "inner"},
+        {{inner, sibling}, HostPath("/volume1/photo/ab"), "sibling"},
+        {{inner}, HostPath("/volume1/photo/ab"), nullptr},
+        {{orphan}, "/anything", nullptr},
+        {{}, inside, nullptr},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.path);
+        const Json::Value governing = GetMostSuitableCfg(c.folders, c.path);
+        if (c.governing == nullptr) {
+            EXPECT_EQ(governing, Json::Value(Json::objectValue));
+        } else {
+            EXPECT_EQ(governing["name"], c.governing);
+        }
+    }
+}
+
+TEST(ChangeReport, FlagsDifferOrOneSideHasNoSetting)
+{
+    const Json::Value none(Json::objectValue);
+    const Json::Value a = ParseJson(R"({"document":true,"audio":false,"video":true,"photo":false})");
+    const Json::Value b = ParseJson(R"({"document":true,"audio":true,"video":false,"photo":false})");
+    EXPECT_EQ(DiffMediaTypes(a, b), Report(false, true, true, false));
+    EXPECT_EQ(DiffMediaTypes(b, a), Report(false, true, true, false));
+    EXPECT_EQ(DiffMediaTypes(a, a), Report(false, false, false, false));
+    EXPECT_EQ(DiffMediaTypes(none, a), Report(true, true, true, true));
+    EXPECT_EQ(DiffMediaTypes(a, none), Report(true, true, true, true));
+}
+
+TEST_F(FoldersTest, BytesThatAreNotUtf8SurviveUpsertSaveLoadAndGet)
+{
+    const std::string path = "/photo/caf\xe9/\xff\"q\\";
+    const std::string name = "n\xfe\x80";
+    Json::Value request;
+    request["path"] = path;
+    request["name"] = name;
+    request["video"] = true;
+    Folders folders;
+    ASSERT_TRUE(folders.Load());
+    Json::Value report;
+    ASSERT_TRUE(folders.Upsert(report, request));
+    ASSERT_TRUE(folders.Save());
+
+    Json::Value record;
+    ASSERT_TRUE(IndexMgr::Get(record, path));
+    EXPECT_EQ(record["path"].asString(), path);
+    EXPECT_EQ(record["name"].asString(), name);
+    std::vector<Folder> listed;
+    ASSERT_TRUE(IndexMgr::List(listed));
+    ASSERT_EQ(listed.size(), 1u);
+    EXPECT_EQ(listed[0].m_fullPath, HostPath("/volume1") + path);
+}
+
+}  // namespace
+}  // namespace fileindex_test

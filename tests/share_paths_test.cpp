@@ -1,0 +1,185 @@
+// Conversions between share-relative and full paths, and the small helpers the library leans on.
+#include <syslog.h>
+#include <unistd.h>
+
+#include "fileindex/error.h"
+#include "fileindex/utils.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/sandbox.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace fileindex_test {
+namespace {
+
+TEST(SharePaths, ShareNameIsTheFirstComponentAfterAnUncheckedFirstCharacter)
+{
+    const struct {
+        const char *path;
+        bool ok;
+        const char *share;
+    } cases[] = {
+        {"", false, "untouched"},
+        {"/", true, ""},
+        {"/photo", true, "photo"},
+        {"/photo/holiday/trip", true, "photo"},
+        {"photo/x", true, "hoto"},
+        {"//x", true, ""},
+        {"/caf\xe9/x", true, "caf\xe9"},
+    };
+    for (const auto &c : cases) {
+        std::string share = "untouched";
+        EXPECT_EQ(GetShareNameByPath(share, c.path), c.ok) << c.path;
+        EXPECT_EQ(share, c.share) << c.path;
+    }
+}
+
+TEST(SharePaths, ReplaceShareNameRewritesOnlyTheFirstComponent)
+{
+    const struct {
+        const char *path;
+        const char *share;
+        const char *result;
+    } cases[] = {
+        {"", "z", ""},
+        {"/a", "b", "/b"},
+        {"/a/b/c", "z", "/z/b/c"},
+        {"x/y", "z", "/z/y"},
+        {"/old/", "new", "/new/"},
+    };
+    for (const auto &c : cases) {
+        EXPECT_EQ(ReplaceShareName(c.path, c.share), c.result) << c.path;
+    }
+}
+
+TEST(SharePaths, StringStartWithIsAPlainBytePrefixTest)
+{
+    EXPECT_TRUE(StringStartWith("/photo2", "/photo"));
+    EXPECT_TRUE(StringStartWith("/photo", "/photo"));
+    EXPECT_TRUE(StringStartWith("anything", ""));
+    EXPECT_FALSE(StringStartWith("/ph", "/photo"));
+    EXPECT_FALSE(StringStartWith("/Photo", "/photo"));
+    EXPECT_FALSE(StringStartWith(std::string("/a\0b", 4), std::string("/a\0c", 4)));
+}
+
+TEST(SharePaths, TypedMembersAreReadOnlyWhenTheTypeIsExact)
+{
+    Json::Value object;
+    object["name"] = "a";
+    object["flag"] = true;
+    object["number"] = 1;
+    object["text"] = "true";
+
+    std::string text = "before";
+    bool flag = false;
+    EXPECT_TRUE(RetrieveStringFromJsonObj(text, "name", object));
+    EXPECT_EQ(text, "a");
+    EXPECT_TRUE(RetrieveBoolFromJsonObj(flag, "flag", object));
+    EXPECT_TRUE(flag);
+
+    text = "before";
+    flag = false;
+    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "number", object));
+    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "missing", object));
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "number", object));
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "text", object));
+    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "0", Json::Value(Json::arrayValue)));
+    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "flag", Json::Value("flag")));
+    EXPECT_EQ(text, "before");
+    EXPECT_FALSE(flag);
+}
+
+class ShareResolutionTest : public SandboxTest {
+protected:
+    void SetUp() override
+    {
+        SandboxTest::SetUp();
+        DeclareShares("volume1/photo volume2/music");
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+    }
+};
+
+TEST_F(ShareResolutionTest, FullPathIsTheShareVolumeFollowedByThePathAsGiven)
+{
+    const struct {
+        const char *path;
+        std::string full;
+    } cases[] = {
+        {"/photo", HostPath("/volume1/photo")},
+        {"/photo/holiday/trip", HostPath("/volume1/photo/holiday/trip")},
+        {"/music//a/", HostPath("/volume2/music//a/")},
+        {"/Photo/x", HostPath("/volume1/Photo/x")},  // the database ignores case; the caller's case is kept
+    };
+    for (const auto &c : cases) {
+        std::string full;
+        EXPECT_TRUE(GetFullPath(full, c.path)) << c.path;
+        EXPECT_EQ(full, c.full);
+    }
+    EXPECT_TRUE(LogCapture::Lines().empty());
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
+}
+
+TEST_F(ShareResolutionTest, UnknownShareSetsCode2WithoutALogLine)
+{
+    std::string full = "untouched";
+    EXPECT_FALSE(GetFullPath(full, "/nosuch/a"));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_PATH);
+    EXPECT_TRUE(LogCapture::Lines().empty());
+}
+
+TEST_F(ShareResolutionTest, EmptyPathLogsAndSetsNoCode)
+{
+    std::string full;
+    EXPECT_FALSE(GetFullPath(full, ""));
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
+    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"GetShareNameByPath failed, path="});
+}
+
+TEST_F(ShareResolutionTest, ShareOfAFullPathFollowsWholeComponents)
+{
+    std::string share;
+    std::string sharePath;
+    ASSERT_TRUE(GetShareNamePathByFullPath(share, sharePath, HostPath("/volume1/photo/a/b")));
+    EXPECT_EQ(share, "photo");
+    EXPECT_EQ(sharePath, SharePath("photo"));
+
+    share = "untouched";
+    const std::string sibling = HostPath("/volume1/photo2/a");
+    EXPECT_FALSE(GetShareNamePathByFullPath(share, sharePath, sibling));
+    EXPECT_EQ(share, "untouched");
+    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_PATH);
+    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"VEXOShareNamePathGet failed, path=" + sibling});
+}
+
+TEST_F(ShareResolutionTest, ExistenceTestsDoNotFollowSymbolicLinks)
+{
+    const std::string dir = SharePath("photo");
+    const std::string file = dir + "/file";
+    WriteFile(file, "x");
+    ASSERT_EQ(symlink(dir.c_str(), (dir + "/dirlink").c_str()), 0);
+    ASSERT_EQ(symlink(file.c_str(), (dir + "/filelink").c_str()), 0);
+
+    EXPECT_TRUE(IsDirExist(dir));
+    EXPECT_FALSE(IsDirExist(file));
+    EXPECT_FALSE(IsDirExist(dir + "/dirlink"));
+    EXPECT_TRUE(IsFileExist(file));
+    EXPECT_FALSE(IsFileExist(dir));
+    EXPECT_FALSE(IsFileExist(dir + "/filelink"));
+    EXPECT_FALSE(IsFileExist(dir + "/missing"));
+}
+
+TEST(LogLines, EveryLineStartsWithSourceFileAndLine)
+{
+    LogCapture::Clear();
+    std::string full;
+    GetFullPath(full, "");
+    const auto lines = LogCapture::Lines();
+    ASSERT_EQ(lines.size(), 1u);
+    EXPECT_EQ(lines[0].priority, LOG_ERR);
+    EXPECT_EQ(lines[0].text.rfind("utils.cpp:", 0), 0u) << lines[0].text;
+    const size_t blank = lines[0].text.find(' ');
+    EXPECT_GT(std::stoi(lines[0].text.substr(10, blank - 10)), 0);
+}
+
+}  // namespace
+}  // namespace fileindex_test

@@ -1,0 +1,95 @@
+#include "tests/support/syscall_faults.h"
+
+#include <dlfcn.h>
+#include <sys/stat.h>
+
+#include <atomic>
+#include <cerrno>
+#include <cstdio>
+
+namespace fileindex_test {
+namespace {
+
+struct Armed {
+    std::atomic<int> errnoValue{0};
+    std::atomic<int> hits{0};
+};
+
+Armed g_faults[3];
+
+Armed &FaultOf(Syscall call)
+{
+    return g_faults[static_cast<int>(call)];
+}
+
+// True (errno set) when the call is to fail.
+bool Fires(Syscall call)
+{
+    Armed &armed = FaultOf(call);
+    const int value = armed.errnoValue.load();
+    if (value == 0) {
+        return false;
+    }
+    ++armed.hits;
+    errno = value;
+    return true;
+}
+
+template <typename Function>
+Function Next(const char *name)
+{
+    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+}  // namespace
+
+SyscallFault::SyscallFault(Syscall call, int errnoValue) : m_call(call)
+{
+    FaultOf(call).hits = 0;
+    FaultOf(call).errnoValue = errnoValue;
+}
+
+SyscallFault::~SyscallFault()
+{
+    FaultOf(m_call).errnoValue = 0;
+}
+
+int SyscallFault::Hits() const
+{
+    return FaultOf(m_call).hits.load();
+}
+
+}  // namespace fileindex_test
+
+using fileindex_test::Syscall;
+
+extern "C" {
+
+int chmod(const char *path, mode_t mode)
+{
+    if (fileindex_test::Fires(Syscall::kChmod)) {
+        return -1;
+    }
+    static const auto next = fileindex_test::Next<int (*)(const char *, mode_t)>("chmod");
+    return next(path, mode);
+}
+
+int fsync(int fd)
+{
+    if (fileindex_test::Fires(Syscall::kFsync)) {
+        return -1;
+    }
+    static const auto next = fileindex_test::Next<int (*)(int)>("fsync");
+    return next(fd);
+}
+
+int rename(const char *from, const char *to)
+{
+    if (fileindex_test::Fires(Syscall::kRename)) {
+        return -1;
+    }
+    static const auto next = fileindex_test::Next<int (*)(const char *, const char *)>("rename");
+    return next(from, to);
+}
+
+}
