@@ -1,7 +1,7 @@
 #include "faults.h"
 
-#include <cerrno>
 #include <map>
+#include <mutex>
 #include <string>
 #include <vector>
 
@@ -20,9 +20,19 @@ struct FaultRule {
     std::optional<int> error;
     std::string file = "emulation";
     int line = 0;
+    int after = 0;  // matching calls that go through before the rule applies
 };
 
-using FaultTable = std::map<std::string, std::vector<FaultRule>>;
+struct FaultTable {
+    std::map<std::string, std::vector<FaultRule>> rules;
+    Json::Value source;  // the file's content, to tell a changed file from one read again
+};
+
+// Matching calls gone through per rule ("after"), counted since faults.json last changed content.
+struct PassedCalls {
+    Json::Value countedFor;
+    std::map<std::pair<std::string, size_t>, int> passed;  // by operation and rule position
+};
 
 bool IntOf(const Json::Value &value, int &out)
 {
@@ -73,6 +83,11 @@ bool ParseRule(const Json::Value &json, FaultRule &rule)
             return false;
         }
     }
+    if (json.isMember("after")) {
+        if (!IntOf(json["after"], rule.after)) {
+            return false;
+        }
+    }
     return true;
 }
 
@@ -81,9 +96,10 @@ bool ParseFaults(const Json::Value &json, FaultTable &table)
     if (!json.isObject()) {
         return json.isNull();
     }
+    table.source = json;
     for (const std::string &op : json.getMemberNames()) {
         const Json::Value &rules = json[op];
-        std::vector<FaultRule> &parsed = table[op];
+        std::vector<FaultRule> &parsed = table.rules[op];
         if (rules.isArray()) {
             for (const Json::Value &rule : rules) {
                 FaultRule one;
@@ -101,17 +117,24 @@ bool ParseFaults(const Json::Value &json, FaultTable &table)
     return true;
 }
 
-const FaultRule *FindRule(const FaultTable &table, const char *op, const char *matchText, bool needsResult)
+const FaultRule *FindRule(const FaultTable &table, const char *op, const char *matchText, bool needsResult,
+                         PassedCalls &calls)
 {
-    const auto found = table.find(op);
-    if (found == table.end()) {
+    const auto found = table.rules.find(op);
+    if (found == table.rules.end()) {
         return nullptr;
     }
-    for (const FaultRule &rule : found->second) {
+    for (size_t index = 0; index < found->second.size(); ++index) {
+        const FaultRule &rule = found->second[index];
         if (needsResult && !rule.result) {
             continue;
         }
         if (rule.match && (matchText == nullptr || *rule.match != matchText)) {
+            continue;
+        }
+        int &passed = calls.passed[{found->first, index}];
+        if (passed < rule.after) {
+            ++passed;
             continue;
         }
         return &rule;
@@ -124,14 +147,18 @@ const FaultRule *ApplyRule(const char *op, const char *matchText, bool needsResu
                            std::shared_ptr<const FaultTable> &holder)
 {
     static CachedStateFile<FaultTable> faults("faults.json", ParseFaults);
-    // Reading the rules must not disturb errno or the error state of the call it belongs to.
-    const int savedErrno = errno;
     holder = faults.Get();
-    errno = savedErrno;
     if (holder == nullptr) {
         return nullptr;  // a faults.json that does not parse forces nothing
     }
-    const FaultRule *rule = FindRule(*holder, op, matchText, needsResult);
+    static std::mutex mutex;
+    static PassedCalls calls;
+    std::lock_guard<std::mutex> lock(mutex);
+    if (calls.countedFor != holder->source) {
+        calls.countedFor = holder->source;
+        calls.passed.clear();
+    }
+    const FaultRule *rule = FindRule(*holder, op, matchText, needsResult, calls);
     if (rule != nullptr && rule->error) {
         SetPlatformError(*rule->error, rule->file.c_str(), rule->line);
     }

@@ -8,7 +8,6 @@
 
 #include <cerrno>
 #include <cstdlib>
-#include <fstream>
 #include <sstream>
 
 namespace VEXO {
@@ -81,11 +80,17 @@ ssize_t ReadRetrying(int fd, void *buffer, size_t size)
 // State letter and start time of a process from /proc/<pid>/stat; false when there is none.
 bool ReadProcessStat(pid_t pid, char &state, unsigned long long &startTime)
 {
-    std::ifstream in("/proc/" + std::to_string(pid) + "/stat");
-    std::string line;
-    if (!in || !std::getline(in, line)) {
+    const int fd = open(("/proc/" + std::to_string(pid) + "/stat").c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) {
         return false;
     }
+    char buffer[1024];
+    const ssize_t got = ReadRetrying(fd, buffer, sizeof(buffer) - 1);
+    close(fd);
+    if (got <= 0) {
+        return false;
+    }
+    const std::string line(buffer, static_cast<size_t>(got));
     // "pid (comm) state ppid ... starttime ...": comm may hold spaces and parentheses.
     const size_t commEnd = line.rfind(')');
     if (commEnd == std::string::npos) {
@@ -186,7 +191,11 @@ bool LaunchDetached(const std::vector<std::string> &argv, LaunchedProcess &proce
             while (read(go[0], &ignored, 1) < 0 && errno == EINTR) {
             }
             setsid();
-            dup2(devNull, STDIN_FILENO);
+            if (devNull == STDIN_FILENO) {
+                fcntl(devNull, F_SETFD, 0);  // dup2 onto itself would keep close-on-exec
+            } else {
+                dup2(devNull, STDIN_FILENO);
+            }
             ResetSignalsInChild();
             execv(args[0], args.data());
             SendInChild(report[1], kExecFailed, errno);

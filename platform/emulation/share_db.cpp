@@ -5,7 +5,9 @@
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
-#include <new>
+#include <memory>
+#include <optional>
+#include <string>
 
 #include "api.h"
 #include "faults.h"

@@ -29,7 +29,7 @@ const ShareInfo *FindShareHolding(const ShareList &shares, const char *path);
 
 // True when path is dir or lies below it by whole components ("/a/bc" is not below "/a/b").
 bool PathWithin(const char *path, const std::string &dir);
-// "<share path>/<name>", for the share's special directories.
+// "<share path>/<name>", for the directories a share keeps for itself (#recycle, #snapshot).
 std::string ShareSubdirectory(const ShareInfo &share, const char *name);
 
 }  // namespace EMULATION
