@@ -43,6 +43,20 @@ public:
     // be cut from its path logs "Failed to get share name from path: <path>" and is passed over.
     static bool IsShareIndexed(const std::string &share);
 
+    // ---- Change-monitor registration ----
+
+    // (Re)registers the share's monitor queue with the notification daemon, owner "fileindex",
+    // type 1: {"queue": the share's event queue file, "config": one {"path": full path,
+    // "mask": 65486, "ignore": ["@eaDir"]} per indexed folder of the share, in path order}. Reads
+    // folder.conf without its lock; a share without folders is registered with an empty "config".
+    // Failures, each false with nothing sent when before the registration: queue path unknown
+    // ("FILEIDXQueuePathGet failed, share=..."), folder.conf unreadable, a folder that does not
+    // resolve ("GetFullPath failed, path=..."), a description the client refuses (no log line),
+    // the registration refused ("MonitorQueue::Add failed"). Nothing is rolled back.
+    static bool UpsertVNotifydCfg(const std::string &share);
+    // Removes the share's registration. Failures: "FILEIDXQueuePathGet failed, share=...",
+    // "MonitorQueue::Delete failed".
+    static bool DeleteVNotifydCfg(const std::string &share);
 };
 
 }  // namespace FILEINDEX

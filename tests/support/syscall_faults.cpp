@@ -2,10 +2,12 @@
 
 #include <dlfcn.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
+#include <mutex>
 
 namespace fileindex_test {
 namespace {
@@ -35,6 +37,27 @@ bool Fires(Syscall call)
     return true;
 }
 
+std::atomic<bool> g_recordingSocketWrites{false};
+std::mutex g_socketWritesMutex;
+std::vector<size_t> g_socketWrites;
+std::function<void()> g_onSocketWrite;
+
+void RecordIfSocket(int fd, size_t size)
+{
+    struct stat st;
+    if (g_recordingSocketWrites && fstat(fd, &st) == 0 && S_ISSOCK(st.st_mode)) {
+        std::function<void()> onWrite;
+        {
+            std::lock_guard<std::mutex> lock(g_socketWritesMutex);
+            g_socketWrites.push_back(size);
+            onWrite = g_onSocketWrite;
+        }
+        if (onWrite) {
+            onWrite();
+        }
+    }
+}
+
 template <typename Function>
 Function Next(const char *name)
 {
@@ -59,6 +82,27 @@ int SyscallFault::Hits() const
     return FaultOf(m_call).hits.load();
 }
 
+SocketWriteRecorder::SocketWriteRecorder(std::function<void()> onWrite)
+{
+    std::lock_guard<std::mutex> lock(g_socketWritesMutex);
+    g_socketWrites.clear();
+    g_onSocketWrite = std::move(onWrite);
+    g_recordingSocketWrites = true;
+}
+
+SocketWriteRecorder::~SocketWriteRecorder()
+{
+    g_recordingSocketWrites = false;
+    std::lock_guard<std::mutex> lock(g_socketWritesMutex);
+    g_onSocketWrite = nullptr;
+}
+
+std::vector<size_t> SocketWriteRecorder::Sizes() const
+{
+    std::lock_guard<std::mutex> lock(g_socketWritesMutex);
+    return g_socketWrites;
+}
+
 }  // namespace fileindex_test
 
 using fileindex_test::Syscall;
@@ -81,6 +125,13 @@ int fsync(int fd)
     }
     static const auto next = fileindex_test::Next<int (*)(int)>("fsync");
     return next(fd);
+}
+
+ssize_t write(int fd, const void *buffer, size_t size)
+{
+    fileindex_test::RecordIfSocket(fd, size);
+    static const auto next = fileindex_test::Next<ssize_t (*)(int, const void *, size_t)>("write");
+    return next(fd, buffer, size);
 }
 
 int rename(const char *from, const char *to)

@@ -1,7 +1,12 @@
-// Makes chosen system calls of this process fail, for tests of failure paths. The test executable
-// defines these calls itself and passes them on to the C library unless a fault is armed.
+// Makes chosen system calls of this process fail, and records socket writes, for tests of failure
+// paths and framing. The test executable defines these calls itself and passes them on to the C
+// library unless a fault is armed.
 #ifndef FILEINDEX_TESTS_SYSCALL_FAULTS_H
 #define FILEINDEX_TESTS_SYSCALL_FAULTS_H
+
+#include <cstddef>
+#include <functional>
+#include <vector>
 
 namespace fileindex_test {
 
@@ -20,6 +25,18 @@ public:
 
 private:
     Syscall m_call;
+};
+
+// Records the size of every write() to a socket made while it exists, in order, and runs onWrite
+// (when given) just before each such write reaches the socket.
+class SocketWriteRecorder {
+public:
+    explicit SocketWriteRecorder(std::function<void()> onWrite = nullptr);
+    ~SocketWriteRecorder();
+    SocketWriteRecorder(const SocketWriteRecorder &) = delete;
+    SocketWriteRecorder &operator=(const SocketWriteRecorder &) = delete;
+
+    std::vector<size_t> Sizes() const;
 };
 
 }  // namespace fileindex_test

@@ -1,0 +1,100 @@
+// The command channel to fileindexd: one framed JSON command per connection, never answered.
+#include <signal.h>
+#include <sys/socket.h>
+#include <sys/time.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdint>
+#include <cstring>
+
+#include "appliance_paths.h"
+#include "config/json_io.h"
+#include "fileindex/utils.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+
+constexpr size_t kMaxWriteSize = 1024;
+constexpr int kEintrAllowance = 3;
+
+// Writes n bytes in pieces of at most 1024. A negative write result is not taken as an error: it
+// is added to the running offset like any other result, stepping back one byte and lengthening
+// what remains, and writing goes on. A zero result is retried only when interrupted, three times.
+// The one limit added is the start of the buffer: stepping back before it would read memory that
+// is not the frame's, so the write fails there instead.
+bool WriteLoop(int fd, const char *buffer, size_t n)
+{
+    long long offset = 0;
+    long long remaining = static_cast<long long>(n);
+    int eintrAllowance = kEintrAllowance;
+    while (remaining > 0) {
+        const size_t piece = std::min(static_cast<size_t>(remaining), kMaxWriteSize);
+        const ssize_t written = write(fd, buffer + offset, piece);
+        if (written != 0) {
+            offset += written;
+            remaining -= written;
+            if (offset < 0) {
+                return false;
+            }
+            continue;
+        }
+        if (errno == EINTR && eintrAllowance > 0) {
+            --eintrAllowance;
+            continue;
+        }
+        return false;
+    }
+    return true;
+}
+
+int ConnectToDaemon()
+{
+    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    if (fd < 0) {
+        return -1;
+    }
+    sockaddr_un address;
+    memset(&address, 0, sizeof(address));
+    address.sun_family = AF_UNIX;
+    static_assert(sizeof(FILEINDEX_DAEMON_SOCKET_PATH) <= sizeof(address.sun_path), "socket path too long");
+    memcpy(address.sun_path, FILEINDEX_DAEMON_SOCKET_PATH, sizeof(FILEINDEX_DAEMON_SOCKET_PATH));
+    if (connect(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)) != 0) {
+        close(fd);
+        return -1;
+    }
+    const timeval sendTimeout = {1, 0};
+    if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &sendTimeout, sizeof(sendTimeout)) != 0) {
+        close(fd);
+        return -1;
+    }
+    return fd;
+}
+
+}  // namespace
+
+bool SendCammandToDaemon(const std::string &type, const Json::Value &data)
+{
+    // A daemon that has gone away must give a failed write, not kill the caller.
+    signal(SIGPIPE, SIG_IGN);
+    const int fd = ConnectToDaemon();
+    if (fd < 0) {
+        return false;
+    }
+    Json::Value command(Json::objectValue);
+    command["type"] = Json::Value(type);
+    command["data"] = data;
+    const std::string text = toString(command);
+    const uint32_t length = static_cast<uint32_t>(text.size() + 1);
+    const bool sent = WriteLoop(fd, reinterpret_cast<const char *>(&length), sizeof(length)) &&
+                      WriteLoop(fd, text.c_str(), text.size() + 1);
+    close(fd);
+    return sent;
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO

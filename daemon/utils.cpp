@@ -1,0 +1,131 @@
+#include <fcntl.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+
+#include "config/file_io.h"
+#include "config/json_io.h"
+#include "config/log.h"
+#include "daemon/event_queue.h"
+#include "fileindex/fileidx.h"
+#include "fileindex/status.h"
+#include "fileindex/utils.h"
+#include "platform/share_db.h"
+#include "share/storage_paths.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+
+constexpr int kShareNameSize = 492;
+constexpr int kPathSize = 4096;
+constexpr int kLockAttempts = 3;
+// A queue file the library creates is readable by everyone and written by its owner (root).
+constexpr mode_t kQueueFileMode = 0644;
+
+enum class Append { kWritten, kContended, kFailed };
+
+// Appends one record line under an exclusive flock on the queue, in a single write so that
+// appends of several processes never interleave. Never waits long: three attempts, 0-9 ms apart.
+Append AppendRecord(const std::string &queue, const std::string &line)
+{
+    for (int attempt = 1;; ++attempt) {
+        const int fd = open(queue.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, kQueueFileMode);
+        if (fd < 0) {
+            return Append::kFailed;
+        }
+        if (flock(fd, LOCK_EX | LOCK_NB) != 0) {
+            const int reason = errno;
+            close(fd);
+            errno = reason;  // what the debug lines' %m names
+            if (reason != EINTR && reason != EAGAIN) {
+                FILEIDX_DEBUG("%s:%d flock fail, path=%s, reason=%m", queue.c_str());
+                return Append::kFailed;
+            }
+            if (attempt == kLockAttempts) {
+                FILEIDX_DEBUG("%s:%d try lock too many times, path=%s, reason=%m", queue.c_str());
+                return Append::kContended;
+            }
+            usleep(static_cast<useconds_t>((rand() % 10) * 1000));
+            continue;
+        }
+        const ssize_t written = write(fd, line.data(), line.size());
+        if (written < static_cast<ssize_t>(line.size())) {
+            FILEIDX_DEBUG("%s:%d write fail, (%ld, %ld)", static_cast<long>(written), static_cast<long>(line.size()));
+        }
+        flock(fd, LOCK_UN);
+        close(fd);
+        return Append::kWritten;
+    }
+}
+
+// The event could not be queued: mark the share for a full reindex so that no change is lost.
+bool FallBackToReindex(const std::string &share)
+{
+    if (!StatusMgr::ShareSetNeedReindex(share, true)) {
+        FILEIDX_LOG("%s:%d ShareSetNeedReindex failed, share=%s", share.c_str());
+    }
+    return false;
+}
+
+}  // namespace
+
+bool HasQueuedReindexEvent(const std::string &path, const std::string &queueFile)
+{
+    if (!IsFileExist(queueFile)) {
+        return false;
+    }
+    bool found = false;
+    const bool read = ForEachLine(queueFile, [&](const std::string &line) {
+        Json::Value record;
+        if (!fromString(record, line) || !record.isObject() || !record.isMember("event") || !record.isMember("path") ||
+            !record["event"].isConvertibleTo(Json::uintValue) || !record["path"].isString()) {
+            return true;
+        }
+        found = record["event"].asUInt() == kEventReindex && record["path"].asString() == path;
+        return !found;
+    });
+    if (!read) {
+        FILEIDX_LOG("%s:%d Failed to open queue=%s, reason=%m", queueFile.c_str());
+    }
+    return found;
+}
+
+bool AddCustomEvent(const int &event, const std::string &path, const Json::Value &data)
+{
+    char shareBuffer[kShareNameSize] = {};
+    char sharePathBuffer[kPathSize] = {};
+    if (VEXOShareNamePathGet(path.c_str(), shareBuffer, kShareNameSize, sharePathBuffer, kPathSize) < 0) {
+        FILEIDX_LOG("%s:%d VEXOShareNamePathGet failed, path=%s", path.c_str());
+        return FallBackToReindex(std::string());
+    }
+    const std::string share = shareBuffer;
+    char queueBuffer[kPathSize] = {};
+    if (FILEIDXQueuePathGet(share.c_str(), queueBuffer, kPathSize) < 0) {
+        FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
+        return FallBackToReindex(share);
+    }
+    const std::string queue = queueBuffer;
+    if (HasQueuedReindexEvent(path, queue) || HasQueuedReindexEvent(path, QueueCompanionPath(queue))) {
+        return true;
+    }
+
+    Json::Value record(Json::objectValue);
+    record["event"] = event;
+    record["path"] = path;
+    record["data"] = data;
+    switch (AppendRecord(queue, toString(record) + "\n")) {
+    case Append::kWritten:
+    case Append::kContended:  // dropped on purpose: another writer is busy with this queue
+        return true;
+    case Append::kFailed:
+        break;
+    }
+    return FallBackToReindex(share);
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO

@@ -1,0 +1,81 @@
+// The status file "/usr/vexo/etc/fileindex/status.conf" (Status) and the operations that change it
+// under its lock and tell the indexing daemon (StatusMgr).
+//
+// Layout, every member optional: "resume_time" (-1 running, 0 paused without end, otherwise paused
+// until that many seconds since the epoch), "no_space" and "need_reindex" (objects whose member
+// names are the marked shares), and any other top-level name set to true by SetUpdated.
+#ifndef FILEINDEX_STATUS_H
+#define FILEINDEX_STATUS_H
+
+#include <string>
+
+#include "fileindex/config.h"
+#include "fileindex/export.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+// The status document in memory. Its operations neither lock, load nor save; they throw the JSON
+// library's Json::LogicError when the loaded document has the wrong shape (for example a top level
+// that is not an object), except GetPauseInfo, which catches it.
+class FILEINDEX_EXPORT Status : public Config {
+public:
+    bool Load() override;
+    bool Save() override;
+    std::string GetLockPath() const override;
+    std::string GetPath() const override;
+
+    // Sets the top-level member name to true. There is no way to clear it.
+    bool SetUpdated(const std::string &name);
+    // True when the member exists and the JSON library reads it as true.
+    bool IsUpdated(const std::string &name);
+
+    // Adds or removes share in "need_reindex". Removing from an absent object leaves
+    // "need_reindex": null in the document, which marks no share.
+    bool ShareSetNeedReindex(const std::string &share, bool flag);
+    bool ShareIsNeedReindex(const std::string &share);
+    // As ShareSetNeedReindex for "no_space"; marking a share that was not marked yet also tells
+    // the administrators (NotifyNoSpace; a failure logs "NotifyNoSpace failed" and the mark is set).
+    bool ShareSetNoSpace(const std::string &share, bool flag);
+    bool ShareIsNoSpace(const std::string &share);
+
+    // Sets "resume_time".
+    bool Pause(long long resumeTime);
+    // Sets "resume_time" to -1.
+    bool Resume();
+    // Reads "resume_time" (-1 when absent). A value that is not an integer logs "json exception"
+    // and answers false, resumeTime untouched.
+    bool GetPauseInfo(long long &resumeTime);
+};
+
+// Each changing operation locks the status file (exclusive, never blocking: error 9 after three
+// attempts), loads, changes, saves, sends its daemon command while still holding the lock, and
+// unlocks on every path. A failed send logs "SendCammandToDaemon failed" and answers false; the
+// saved change stays. Reading operations load without the lock and answer false when status.conf
+// cannot be read.
+class FILEINDEX_EXPORT StatusMgr {
+public:
+    static bool SetUpdated(const std::string &name);
+    static bool IsUpdated(const std::string &name);
+
+    static bool ShareSetNoSpace(const std::string &share, bool flag);
+    static bool ShareIsNoSpace(const std::string &share);
+    static bool ShareSetNeedReindex(const std::string &share, bool flag);
+    static bool ShareIsNeedReindex(const std::string &share);
+
+    // Clears the share's no-space mark and sends "revive_share_worker" {"share_name": share}.
+    static bool ShareRevive(const std::string &share);
+
+    // Stores "resume_time" -1 and sends "resume" {}.
+    static bool Resume();
+    // Pauses indexing for hours (0: until Resume) and sends "pause" {"resume_time": t}, where t is
+    // 0 or now + hours * 3600 computed in 32-bit signed arithmetic, stored and sent alike.
+    // Negative hours: false, error 1 (FILEIDX_ERR_BAD_PARAM), nothing locked, written or sent.
+    static bool Pause(const int &hours);
+    static bool GetPauseInfo(long long &resumeTime);
+};
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+#endif

@@ -1,0 +1,123 @@
+#include "fileindex/status.h"
+
+#include <json/value.h>
+
+#include "appliance_paths.h"
+#include "config/log.h"
+#include "fileindex/utils.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+
+const char kResumeTime[] = "resume_time";
+const char kNoSpace[] = "no_space";
+const char kNeedReindex[] = "need_reindex";
+constexpr long long kNotPaused = -1;
+
+// Adds or removes share in the per-share mark object key. Returns whether share was newly added.
+bool SetShareMark(Json::Value &document, const char *key, const std::string &share, bool flag)
+{
+    if (!document.isMember(key) || !document[key].isObject()) {
+        document[key];  // creates key as null when absent; any other value is left as it is
+    }
+    Json::Value &marks = document[key];
+    if (!flag) {
+        marks.removeMember(share);
+        return false;
+    }
+    const bool added = !marks.isMember(share);
+    marks[share] = true;
+    return added;
+}
+
+bool HasShareMark(const Json::Value &document, const char *key, const std::string &share)
+{
+    const Json::Value &marks = document[key];
+    return marks.isObject() && marks.isMember(share);
+}
+
+}  // namespace
+
+std::string Status::GetPath() const
+{
+    return FILEINDEX_STATUS_CONF_PATH;
+}
+
+std::string Status::GetLockPath() const
+{
+    return FILEINDEX_STATUS_LOCK_PATH;
+}
+
+bool Status::Load()
+{
+    return LoadJson();
+}
+
+bool Status::Save()
+{
+    return SaveJson();
+}
+
+bool Status::SetUpdated(const std::string &name)
+{
+    m_jsConfig[name] = true;
+    return true;
+}
+
+bool Status::IsUpdated(const std::string &name)
+{
+    return m_jsConfig.isMember(name) && m_jsConfig[name].asBool();
+}
+
+bool Status::ShareSetNeedReindex(const std::string &share, bool flag)
+{
+    SetShareMark(m_jsConfig, kNeedReindex, share, flag);
+    return true;
+}
+
+bool Status::ShareIsNeedReindex(const std::string &share)
+{
+    return HasShareMark(m_jsConfig, kNeedReindex, share);
+}
+
+bool Status::ShareSetNoSpace(const std::string &share, bool flag)
+{
+    // The administrators hear of a share only when it is newly marked.
+    if (SetShareMark(m_jsConfig, kNoSpace, share, flag) && !NotifyNoSpace()) {
+        FILEIDX_LOG("%s:%d NotifyNoSpace failed");
+    }
+    return true;
+}
+
+bool Status::ShareIsNoSpace(const std::string &share)
+{
+    return HasShareMark(m_jsConfig, kNoSpace, share);
+}
+
+bool Status::Pause(long long resumeTime)
+{
+    m_jsConfig[kResumeTime] = Json::Int64(resumeTime);
+    return true;
+}
+
+bool Status::Resume()
+{
+    m_jsConfig[kResumeTime] = Json::Int64(kNotPaused);
+    return true;
+}
+
+bool Status::GetPauseInfo(long long &resumeTime)
+{
+    try {
+        resumeTime = m_jsConfig.get(kResumeTime, Json::Int64(kNotPaused)).asInt64();
+    } catch (const Json::Exception &) {
+        FILEIDX_LOG("%s:%d json exception");
+        return false;
+    }
+    return true;
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO

@@ -1,0 +1,244 @@
+// fileindex-demo: a walk through the library on the emulated platform, under the build's sandbox
+// root. It sets up an appliance with three shares, starts a stand-in for fileindexd as the
+// "fileindexd" service, and then uses the library as a management program would: paths are
+// resolved, folder settings stored under the folder lock, the folders registered for change
+// monitoring, indexing paused and resumed, a share marked out of space and revived, and events
+// queued. Every command that reaches the stand-in daemon is printed at the end.
+#include <fcntl.h>
+#include <ftw.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <fstream>
+#include <iostream>
+#include <sstream>
+#include <string>
+
+#include <json/json.h>
+
+#include "appliance_paths.h"
+#include "fileindex/error.h"
+#include "fileindex/fileidx.h"
+#include "fileindex/folder.h"
+#include "fileindex/index_mgr.h"
+#include "fileindex/status.h"
+#include "fileindex/utils.h"
+#include "platform/service.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace {
+
+const std::string kRoot = FILEINDEX_ROOT_DIR;
+const std::string kState = FILEINDEX_EMULATION_STATE_DIR;
+const std::string kCommandsFile = kRoot + "/fileindexd-commands.jsonl";
+
+void Step(const std::string &title)
+{
+    std::cout << "\n== " << title << "\n";
+}
+
+void Show(const std::string &label, const std::string &value)
+{
+    std::cout << "   " << label << ": " << value << "\n";
+}
+
+std::string Compact(const Json::Value &value)
+{
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    builder["emitUTF8"] = true;
+    return Json::writeString(builder, value);
+}
+
+std::string ReadText(const std::string &path)
+{
+    std::ifstream in(path, std::ios::binary);
+    std::ostringstream text;
+    text << in.rdbuf();
+    return text.str();
+}
+
+void WriteText(const std::string &path, const std::string &text)
+{
+    std::ofstream(path, std::ios::binary | std::ios::trunc) << text;
+}
+
+void MakeDirs(const std::string &path)
+{
+    for (size_t slash = path.find('/', 1);; slash = path.find('/', slash + 1)) {
+        mkdir(path.substr(0, slash).c_str(), 0755);
+        if (slash == std::string::npos) {
+            return;
+        }
+    }
+}
+
+int RemoveEntry(const char *path, const struct stat *, int, struct FTW *ftw)
+{
+    if (ftw->level > 0) {
+        remove(path);
+    }
+    return 0;
+}
+
+// A fresh appliance: configuration, lock and run directories, the emulated share database, the
+// administrators' notification tool, and the stand-in daemon configured as the fileindexd service.
+bool SetUpAppliance(const std::string &standInDaemon)
+{
+    if (kRoot.empty()) {
+        std::cerr << "this demo needs a build with a sandbox FILEINDEX_ROOT\n";
+        return false;
+    }
+    nftw(kRoot.c_str(), RemoveEntry, 32, FTW_DEPTH | FTW_PHYS);
+    for (const char *dir : {"/tmp", "/usr/vexo/etc/fileindex", "/usr/vexo/bin", "/var/run", "/volume1/photo/holiday",
+                            "/volume1/video", "/volume2/music"}) {
+        MakeDirs(kRoot + dir);
+    }
+    MakeDirs(kState);
+    Json::Value shares(Json::arrayValue);
+    for (const char *location : {"volume1/photo", "volume1/video", "volume2/music"}) {
+        Json::Value share;
+        share["name"] = std::string(location).substr(8);
+        share["path"] = kRoot + "/" + location;
+        shares.append(share);
+    }
+    WriteText(kState + "/shares.json", Compact(shares));
+    WriteText(FILEINDEX_NOTIFY_TOOL_PATH, "#!/bin/sh\nexit 0\n");
+    chmod(FILEINDEX_NOTIFY_TOOL_PATH, 0755);
+    Json::Value commands;
+    commands["fileindexd"].append(standInDaemon);
+    commands["fileindexd"].append("--output");
+    commands["fileindexd"].append(kCommandsFile);
+    WriteText(kState + "/service_commands.json", Compact(commands));
+    return true;
+}
+
+void WaitForDaemonSocket()
+{
+    for (int i = 0; i < 500 && access(FILEINDEX_DAEMON_SOCKET_PATH, F_OK) != 0; ++i) {
+        usleep(10000);
+    }
+}
+
+std::string StandInDaemonPath(const char *argv0)
+{
+    const std::string self = argv0;
+    const size_t slash = self.rfind('/');
+    return (slash == std::string::npos ? std::string(".") : self.substr(0, slash)) + "/fileindex-standin-daemon";
+}
+
+}  // namespace
+
+int main(int, char **argv)
+{
+    std::cout << "libfileindex demo on the emulated platform, sandbox root " << kRoot << "\n";
+    if (!SetUpAppliance(StandInDaemonPath(argv[0]))) {
+        return 1;
+    }
+
+    Step("The indexing service starts (the stand-in daemon listens on the daemon socket)");
+    Show("VLIBServiceStart(\"fileindexd\")", std::to_string(VLIBServiceStart("fileindexd", 1)));
+    WaitForDaemonSocket();
+
+    Step("Shares and paths");
+    std::string fullPath;
+    GetFullPath(fullPath, "/photo/holiday");
+    Show("/photo/holiday is", fullPath);
+    std::string share;
+    std::string sharePath;
+    GetShareNamePathByFullPath(share, sharePath, fullPath);
+    Show("its share", share + " at " + sharePath);
+    Show("/Photo/x (the share database ignores case)", GetFullPath(fullPath, "/Photo/x") ? fullPath : "unresolved");
+
+    Step("Folder settings stored under the folder lock");
+    {
+        Folders folders;
+        const bool locked = folders.Lock(true);
+        Show("locked", locked ? "yes" : "no");
+        if (locked && folders.Load()) {
+            for (const char *request : {R"({"path":"/photo/holiday","name":"Holiday","photo":true})",
+                                        R"({"path":"/video","name":"Films","video":true})",
+                                        R"({"path":"/photo/holiday","document":true})"}) {
+                Json::Value setting;
+                Json::Reader().parse(request, setting);
+                Json::Value report;
+                folders.Upsert(report, setting);
+                Show("upsert " + std::string(request), "change report " + Compact(report));
+            }
+            Show("saved", folders.Save() ? "yes" : "no");
+        }
+        folders.Unlock();
+    }
+    Show("folder.conf", ReadText(FILEINDEX_FOLDER_CONF_PATH));
+
+    Step("Lookups and queries");
+    Json::Value record;
+    IndexMgr::Get(record, "/photo/holiday");
+    Show("IndexMgr::Get(/photo/holiday)", Compact(record));
+    Show("IsPathIndexed(/photo/holiday/2024)", IndexMgr::IsPathIndexed("/photo/holiday/2024") ? "yes" : "no");
+    Show("IsPathIndexed(/photo/holiday2)", IndexMgr::IsPathIndexed("/photo/holiday2") ? "yes" : "no");
+    Show("IsPathContainIndexed(/photo)", IndexMgr::IsPathContainIndexed("/photo") ? "yes" : "no");
+    Show("FILEIDXIsShareIndexed(music)", std::to_string(FILEIDXIsShareIndexed("music")));
+
+    Step("A writer in another process holds the folder lock");
+    {
+        int ready[2];
+        if (pipe(ready) != 0) {
+            return 1;
+        }
+        const pid_t holder = fork();
+        if (holder == 0) {
+            const int fd = open(FILEINDEX_FOLDER_LOCK_PATH, O_RDWR);
+            flock(fd, LOCK_EX);
+            (void)write(ready[1], "r", 1);
+            pause();
+            _exit(0);
+        }
+        char byte;
+        (void)read(ready[0], &byte, 1);
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        const bool got = IndexMgr::Get(record, "/photo/holiday");
+        Show("IndexMgr::Get", std::string(got ? "succeeded" : "failed") + ", error code " +
+                                  std::to_string(ErrorHandler::GetError()) + " (lock)");
+        kill(holder, SIGKILL);
+        waitpid(holder, nullptr, 0);
+        close(ready[0]);
+        close(ready[1]);
+    }
+
+    Step("Change monitoring for the photo share");
+    Show("UpsertVNotifydCfg(photo)", IndexMgr::UpsertVNotifydCfg("photo") ? "registered" : "failed");
+    Show("registrations", ReadText(kState + "/monitor_queues.json"));
+
+    Step("Pause, resume, out of space, revive");
+    Show("StatusMgr::Pause(2)", StatusMgr::Pause(2) ? "sent" : "failed");
+    long long resumeTime = 0;
+    StatusMgr::GetPauseInfo(resumeTime);
+    Show("resume_time", std::to_string(resumeTime));
+    Show("StatusMgr::Resume()", StatusMgr::Resume() ? "sent" : "failed");
+    Show("StatusMgr::ShareSetNoSpace(photo)", StatusMgr::ShareSetNoSpace("photo", true) ? "marked" : "failed");
+    Show("StatusMgr::ShareRevive(photo)", StatusMgr::ShareRevive("photo") ? "sent" : "failed");
+    Show("status.conf", ReadText(FILEINDEX_STATUS_CONF_PATH));
+
+    Step("Events in the photo share's queue");
+    GetFullPath(fullPath, "/photo/holiday");
+    AddCustomEvent(65536, fullPath, Json::Value());
+    Json::Value report;
+    report["photo"] = true;
+    Show("AddCustomEvent(131072) after a pending reindex", AddCustomEvent(131072, fullPath, report) ? "true" : "false");
+    char queue[4096];
+    FILEIDXQueuePathGet("photo", queue, sizeof(queue));
+    Show("queue", ReadText(queue));
+
+    Step("What reached the platform (journal of the emulation)");
+    std::cout << ReadText(kState + "/journal.jsonl");
+
+    VLIBServiceStop("fileindexd", 1);
+    Step("Commands the stand-in daemon received");
+    std::cout << ReadText(kCommandsFile);
+    return 0;
+}
