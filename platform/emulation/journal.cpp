@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <string>
 
+#include "config/json_io.h"
 #include "json_text.h"
 #include "state_dir.h"
 
@@ -15,8 +16,8 @@ namespace EMULATION {
 void JournalCall(const char *op, const Json::Value &args, const Json::Value &result, bool forced)
 {
     // Members in the order a reader expects them, which a Json::Value object would not keep.
-    std::string line = "{\"op\":" + CompactJson(TextValue(op)) + ",\"args\":" + CompactJson(args) +
-                       ",\"result\":" + CompactJson(result) + ",\"pid\":" + std::to_string(getpid());
+    std::string line = "{\"op\":" + FILEINDEX::toString(TextValue(op)) + ",\"args\":" + FILEINDEX::toString(args) +
+                       ",\"result\":" + FILEINDEX::toString(result) + ",\"pid\":" + std::to_string(getpid());
     if (forced) {
         line += ",\"forced\":true";
     }

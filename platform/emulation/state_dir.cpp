@@ -8,7 +8,8 @@
 #include <cstdlib>
 
 #include "appliance_paths.h"
-#include "json_text.h"
+#include "config/file_io.h"
+#include "config/json_io.h"
 
 namespace VEXO {
 namespace EMULATION {
@@ -16,39 +17,6 @@ namespace {
 
 // A file modified this close to the moment it was read is read again on its next use.
 constexpr time_t kRacySeconds = 2;
-
-bool WriteAll(int fd, const std::string &text)
-{
-    const char *data = text.data();
-    size_t left = text.size();
-    while (left > 0) {
-        const ssize_t written = write(fd, data, left);
-        if (written < 0) {
-            if (errno == EINTR) {
-                continue;
-            }
-            return false;
-        }
-        data += written;
-        left -= static_cast<size_t>(written);
-    }
-    return true;
-}
-
-bool ReadAll(int fd, std::string &text)
-{
-    char buffer[16384];
-    for (;;) {
-        const ssize_t got = read(fd, buffer, sizeof(buffer));
-        if (got < 0 && errno == EINTR) {
-            continue;
-        }
-        if (got <= 0) {
-            return got == 0;
-        }
-        text.append(buffer, static_cast<size_t>(got));
-    }
-}
 
 }  // namespace
 
@@ -81,37 +49,19 @@ StateLock::~StateLock()
 ReadStatus ReadJsonFile(const std::string &path, Json::Value &value)
 {
     value = Json::Value(Json::nullValue);
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd < 0) {
-        return errno == ENOENT ? ReadStatus::kMissing : ReadStatus::kBad;
-    }
     std::string text;
-    const bool read = ReadAll(fd, text);
-    close(fd);
-    if (!read) {
-        return ReadStatus::kBad;
+    if (!FILEINDEX::ReadWholeFile(path, text)) {
+        return errno == ENOENT ? ReadStatus::kMissing : ReadStatus::kBad;
     }
     if (text.find_first_not_of(" \t\r\n") == std::string::npos) {
         return ReadStatus::kMissing;
     }
-    return ParseJson(text, value) ? ReadStatus::kRead : ReadStatus::kBad;
+    return FILEINDEX::fromString(value, text) ? ReadStatus::kRead : ReadStatus::kBad;
 }
 
 bool ReplaceJsonFile(const std::string &path, const Json::Value &value)
 {
-    const std::string text = CompactJson(value) + "\n";
-    std::string tempPath = path + ".tmp." + std::to_string(getpid()) + ".XXXXXX";
-    const int fd = mkostemp(&tempPath[0], O_CLOEXEC);
-    if (fd < 0) {
-        return false;
-    }
-    const bool written = fchmod(fd, 0644) == 0 && WriteAll(fd, text);
-    const bool closed = close(fd) == 0;
-    if (!written || !closed || rename(tempPath.c_str(), path.c_str()) != 0) {
-        unlink(tempPath.c_str());
-        return false;
-    }
-    return true;
+    return FILEINDEX::ReplaceFileAtomically(path, FILEINDEX::toString(value) + "\n");
 }
 
 bool FileStamp::operator==(const FileStamp &other) const
