@@ -87,18 +87,6 @@ TEST_F(FoldersTest, FullPathOfALoadedFolderIsCachedAndAFailedOneIsLogged)
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to get full path from /photo/b"});
 }
 
-TEST_F(FoldersTest, AddToJsonRefusesAnythingButAnObject)
-{
-    const Folder folder = MakeFolder("/photo/a");
-    Json::Value array(Json::arrayValue);
-    EXPECT_FALSE(folder.AddToJson(array));
-    EXPECT_EQ(array, Json::Value(Json::arrayValue));
-    Json::Value object(Json::objectValue);
-    object["/photo/a"] = 1;
-    EXPECT_TRUE(folder.AddToJson(object));
-    EXPECT_EQ(object["/photo/a"], folder.asJson());
-}
-
 TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
 {
     const struct {
