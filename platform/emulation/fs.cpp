@@ -168,13 +168,11 @@ extern "C" VEXOEMU_API int VLIBFhsPathInSnapshot(const char *szPath, int *pInSna
             EMU_SET_ERROR(kErrBadArgument);
             return -1;
         }
-        const std::shared_ptr<const ShareList> shares = LoadShares();
-        if (shares == nullptr) {
-            EMU_SET_ERROR(kErrStateFile);
+        bool inSnapshot = false;
+        if (!IsInShareSubdirectory(szPath, "#snapshot", inSnapshot)) {
             return -1;
         }
-        const ShareInfo *share = FindShareHolding(*shares, szPath);
-        *pInSnapshot = share != nullptr && PathWithin(szPath, ShareSubdirectory(*share, "#snapshot")) ? 1 : 0;
+        *pInSnapshot = inSnapshot ? 1 : 0;
         return 0;
     });
 }

@@ -80,7 +80,6 @@ extern "C" VEXOEMU_API int VEXOShareGet(const char *szName, PVEXOSHARE *ppShare)
         }
         const std::shared_ptr<const ShareList> shares = LoadShares();
         if (shares == nullptr) {
-            EMU_SET_ERROR(kErrStateFile);
             return -1;
         }
         const ShareInfo *share = FindShareByName(*shares, szName);
@@ -131,7 +130,6 @@ extern "C" VEXOEMU_API int VEXOShareNamePathGet(const char *szFullPath, char *sz
         }
         const std::shared_ptr<const ShareList> shares = LoadShares();
         if (shares == nullptr) {
-            EMU_SET_ERROR(kErrStateFile);
             return -1;
         }
         const ShareInfo *share = FindShareHolding(*shares, szFullPath);
@@ -155,13 +153,8 @@ extern "C" VEXOEMU_API int VEXOShareIsShareRecycle(const char *szPath)
             EMU_SET_ERROR(kErrBadArgument);
             return 0;
         }
-        const std::shared_ptr<const ShareList> shares = LoadShares();
-        if (shares == nullptr) {
-            EMU_SET_ERROR(kErrStateFile);
-            return 0;
-        }
-        const ShareInfo *share = FindShareHolding(*shares, szPath);
-        return share != nullptr && PathWithin(szPath, ShareSubdirectory(*share, "#recycle")) ? 1 : 0;
+        bool inRecycleBin = false;
+        return IsInShareSubdirectory(szPath, "#recycle", inRecycleBin) && inRecycleBin ? 1 : 0;
     });
 }
 

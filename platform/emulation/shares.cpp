@@ -4,6 +4,7 @@
 
 #include <json/value.h>
 
+#include "api.h"
 #include "state_dir.h"
 
 namespace VEXO {
@@ -75,7 +76,11 @@ bool EqualIgnoringAsciiCase(const std::string &a, const char *b)
 std::shared_ptr<const ShareList> LoadShares()
 {
     static CachedStateFile<ShareList> shares("shares.json", ParseShares);
-    return shares.Get();
+    std::shared_ptr<const ShareList> current = shares.Get();
+    if (current == nullptr) {
+        EMU_SET_ERROR(kErrStateFile);
+    }
+    return current;
 }
 
 const ShareInfo *FindShareByName(const ShareList &shares, const char *name)
@@ -107,9 +112,15 @@ bool PathWithin(const char *path, const std::string &dir)
     return std::strncmp(path, dir.c_str(), dir.size()) == 0 && (path[dir.size()] == '\0' || path[dir.size()] == '/');
 }
 
-std::string ShareSubdirectory(const ShareInfo &share, const char *name)
+bool IsInShareSubdirectory(const char *path, const char *name, bool &inside)
 {
-    return (share.path == "/" ? std::string() : share.path) + "/" + name;
+    const std::shared_ptr<const ShareList> shares = LoadShares();
+    if (shares == nullptr) {
+        return false;
+    }
+    const ShareInfo *share = FindShareHolding(*shares, path);
+    inside = share != nullptr && PathWithin(path, (share->path == "/" ? std::string() : share->path) + "/" + name);
+    return true;
 }
 
 }  // namespace EMULATION

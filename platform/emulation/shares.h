@@ -19,7 +19,8 @@ struct ShareInfo {
 
 using ShareList = std::vector<ShareInfo>;
 
-// The database as shares.json holds it now; null when the file is unreadable or malformed.
+// The database as shares.json holds it now; null, with kErrStateFile in the error state, when the
+// file is unreadable or malformed.
 std::shared_ptr<const ShareList> LoadShares();
 
 // The first share whose name equals the text ignoring ASCII letter case; null when none does.
@@ -29,8 +30,9 @@ const ShareInfo *FindShareHolding(const ShareList &shares, const char *path);
 
 // True when path is dir or lies below it by whole components ("/a/bc" is not below "/a/b").
 bool PathWithin(const char *path, const std::string &dir);
-// "<share path>/<name>", for the directories a share keeps for itself (#recycle, #snapshot).
-std::string ShareSubdirectory(const ShareInfo &share, const char *name);
+// Sets inside to whether path lies in "<share path>/<name>" of the share holding it, for the
+// directories a share keeps for itself (#recycle, #snapshot). False when LoadShares fails.
+bool IsInShareSubdirectory(const char *path, const char *name, bool &inside);
 
 }  // namespace EMULATION
 }  // namespace VEXO
