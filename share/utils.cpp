@@ -135,21 +135,33 @@ bool IsFileExist(const std::string &path)
 
 // ---- Typed JSON members ----
 
+namespace {
+
+// object[key] when object is an object holding that member, else null; one look-up.
+const Json::Value *FindMember(const Json::Value &object, const std::string &key)
+{
+    return object.isObject() ? object.find(key.data(), key.data() + key.size()) : nullptr;
+}
+
+}  // namespace
+
 bool RetrieveStringFromJsonObj(std::string &value, const std::string &key, const Json::Value &object)
 {
-    if (!object.isObject() || !object.isMember(key) || !object[key].isString()) {
+    const Json::Value *member = FindMember(object, key);
+    if (member == nullptr || !member->isString()) {
         return false;
     }
-    value = object[key].asString();
+    value = member->asString();
     return true;
 }
 
 bool RetrieveBoolFromJsonObj(bool &value, const std::string &key, const Json::Value &object)
 {
-    if (!object.isObject() || !object.isMember(key) || !object[key].isBool()) {
+    const Json::Value *member = FindMember(object, key);
+    if (member == nullptr || !member->isBool()) {
         return false;
     }
-    value = object[key].asBool();
+    value = member->asBool();
     return true;
 }
 
