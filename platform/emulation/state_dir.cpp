@@ -46,17 +46,28 @@ StateLock::~StateLock()
     }
 }
 
-ReadStatus ReadJsonFile(const std::string &path, Json::Value &value)
+bool ReadStateText(const std::string &path, std::string &text)
+{
+    return FILEINDEX::ReadWholeFile(path, text);
+}
+
+ReadStatus ParseStateText(const std::string &text, Json::Value &value)
 {
     value = Json::Value(Json::nullValue);
-    std::string text;
-    if (!FILEINDEX::ReadWholeFile(path, text)) {
-        return errno == ENOENT ? ReadStatus::kMissing : ReadStatus::kBad;
-    }
     if (text.find_first_not_of(" \t\r\n") == std::string::npos) {
         return ReadStatus::kMissing;
     }
     return FILEINDEX::fromString(value, text) ? ReadStatus::kRead : ReadStatus::kBad;
+}
+
+ReadStatus ReadJsonFile(const std::string &path, Json::Value &value)
+{
+    value = Json::Value(Json::nullValue);
+    std::string text;
+    if (!ReadStateText(path, text)) {
+        return errno == ENOENT ? ReadStatus::kMissing : ReadStatus::kBad;
+    }
+    return ParseStateText(text, value);
 }
 
 bool ReplaceJsonFile(const std::string &path, const Json::Value &value)

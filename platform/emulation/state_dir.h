@@ -38,6 +38,9 @@ enum class ReadStatus { kRead, kMissing, kBad };
 
 // Reads and parses a whole file. A missing or empty file is kMissing and leaves a null value.
 ReadStatus ReadJsonFile(const std::string &path, Json::Value &value);
+// The two halves of ReadJsonFile: the raw text, and its parse (a blank text is kMissing).
+bool ReadStateText(const std::string &path, std::string &text);
+ReadStatus ParseStateText(const std::string &text, Json::Value &value);
 // Replaces the file with the value's compact text through a temporary file and a rename, so that
 // readers see the old or the new content and nothing in between.
 bool ReplaceJsonFile(const std::string &path, const Json::Value &value);
@@ -77,25 +80,30 @@ public:
             return nullptr;
         }
         std::lock_guard<std::mutex> guard(m_mutex);
-        if (m_loaded && !m_racy && stamp == m_stamp) {
+        if (m_loaded && stamp == m_stamp && !m_racy) {
             return m_value;
         }
         timespec readAt = {0, 0};
         clock_gettime(CLOCK_REALTIME, &readAt);
-        Json::Value json;
-        if (ReadJsonFile(path, json) == ReadStatus::kBad) {
+        std::string text;
+        if (stamp.exists && !ReadStateText(path, text)) {
             m_loaded = false;
             return nullptr;
         }
-        auto parsed = std::make_shared<T>();
-        if (!m_parse(json, *parsed)) {
-            m_loaded = false;
-            return nullptr;
+        // A racy stamp forces a read, but an unchanged text needs no new parse.
+        if (!(m_loaded && stamp == m_stamp && text == m_text)) {
+            Json::Value json;
+            auto parsed = std::make_shared<T>();
+            if (ParseStateText(text, json) == ReadStatus::kBad || !m_parse(json, *parsed)) {
+                m_loaded = false;
+                return nullptr;
+            }
+            m_value = std::move(parsed);
+            m_text = std::move(text);
         }
         // The stamp taken before the read: a change during the read shows as a new stamp next time.
         m_stamp = stamp;
         m_racy = StampIsRacy(stamp, readAt);
-        m_value = std::move(parsed);
         m_loaded = true;
         return m_value;
     }
@@ -107,6 +115,7 @@ private:
     bool m_loaded = false;
     bool m_racy = false;
     FileStamp m_stamp;
+    std::string m_text;
     std::shared_ptr<const T> m_value;
 };
 
