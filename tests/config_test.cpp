@@ -250,18 +250,6 @@ TEST_F(ConfigTest, FailedChmodAfterAWriteStillCountsAsSaved)
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"chmod failed, path=" + kDocPath});
 }
 
-TEST_F(ConfigTest, PathWithBytesThatAreNotUtf8SurvivesSaveAndLoad)
-{
-    const std::string path = std::string("/photo/caf\xe9/\xff\xfe\"quote\\back\x01");
-    TestDoc doc;
-    doc.Doc()[path] = path;
-    ASSERT_TRUE(doc.Save());
-    TestDoc reread;
-    ASSERT_TRUE(reread.Load());
-    ASSERT_TRUE(reread.Doc().isMember(path));
-    EXPECT_EQ(reread.Doc()[path].asString(), path);
-}
-
 // A reader that takes no lock must see either the previous document or the next, never a mix.
 TEST_F(ConfigTest, ReaderWithoutLockNeverSeesATornDocument)
 {

@@ -351,18 +351,6 @@ TEST_F(FoldersTest, GoverningSettingIsTheLastMatchInListOrderNotTheInnermost)
     }
 }
 
-TEST(ChangeReport, FlagsDifferOrOneSideHasNoSetting)
-{
-    const Json::Value none(Json::objectValue);
-    const Json::Value a = ParseJson(R"({"document":true,"audio":false,"video":true,"photo":false})");
-    const Json::Value b = ParseJson(R"({"document":true,"audio":true,"video":false,"photo":false})");
-    EXPECT_EQ(DiffMediaTypes(a, b), Report(false, true, true, false));
-    EXPECT_EQ(DiffMediaTypes(b, a), Report(false, true, true, false));
-    EXPECT_EQ(DiffMediaTypes(a, a), Report(false, false, false, false));
-    EXPECT_EQ(DiffMediaTypes(none, a), Report(true, true, true, true));
-    EXPECT_EQ(DiffMediaTypes(a, none), Report(true, true, true, true));
-}
-
 TEST_F(FoldersTest, BytesThatAreNotUtf8SurviveUpsertSaveLoadAndGet)
 {
     const std::string path = "/photo/caf\xe9/\xff\"q\\";

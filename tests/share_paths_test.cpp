@@ -62,33 +62,6 @@ TEST(SharePaths, StringStartWithIsAPlainBytePrefixTest)
     EXPECT_FALSE(StringStartWith(std::string("/a\0b", 4), std::string("/a\0c", 4)));
 }
 
-TEST(SharePaths, TypedMembersAreReadOnlyWhenTheTypeIsExact)
-{
-    Json::Value object;
-    object["name"] = "a";
-    object["flag"] = true;
-    object["number"] = 1;
-    object["text"] = "true";
-
-    std::string text = "before";
-    bool flag = false;
-    EXPECT_TRUE(RetrieveStringFromJsonObj(text, "name", object));
-    EXPECT_EQ(text, "a");
-    EXPECT_TRUE(RetrieveBoolFromJsonObj(flag, "flag", object));
-    EXPECT_TRUE(flag);
-
-    text = "before";
-    flag = false;
-    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "number", object));
-    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "missing", object));
-    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "number", object));
-    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "text", object));
-    EXPECT_FALSE(RetrieveStringFromJsonObj(text, "0", Json::Value(Json::arrayValue)));
-    EXPECT_FALSE(RetrieveBoolFromJsonObj(flag, "flag", Json::Value("flag")));
-    EXPECT_EQ(text, "before");
-    EXPECT_FALSE(flag);
-}
-
 class ShareResolutionTest : public SandboxTest {
 protected:
     void SetUp() override
