@@ -23,7 +23,6 @@ public:
     // Waits for the child to end; its exit status, or 128 + signal.
     int Wait();
     void Kill(int signal);
-    pid_t Pid() const { return m_pid; }
 
 private:
     pid_t m_pid;
