@@ -6,6 +6,7 @@
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
 #include "platform/monitor_queue.h"
+#include "share/storage_paths.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -36,7 +37,7 @@ bool IndexMgr::UpsertVNotifydCfg(const std::string &share)
     }
 
     Json::Value ignore(Json::arrayValue);
-    ignore.append("@eaDir");
+    ignore.append(kMetadataDirName);
     Json::Value config(Json::arrayValue);
     for (const Folder &folder : shareFolders) {
         std::string fullPath;

@@ -12,6 +12,7 @@
 #include "platform/error_state.h"
 #include "platform/fs.h"
 #include "platform/share_db.h"
+#include "share/storage_paths.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -20,16 +21,11 @@ namespace {
 
 constexpr int kShareNameSize = 492;
 constexpr int kSharePathSize = 4096;
-
-// Per-share storage inside the share's hidden metadata directory.
-const char kMetadataDir[] = "@eaDir";
-const char kQueueFileName[] = "VEXO@file_index_queue";
-const char kDatabaseDirName[] = "VEXO@.fileindexdb";
 constexpr int kPlatformBadParameter = 0x0D00;
 
-// Formats S/@eaDir/<name> of the share into out, making S/@eaDir (and, for the database, the final
-// directory) on the way. The length written, or -1 when the arguments are invalid or the share is
-// unknown.
+// Formats S/@eaDir/<name> of the share into out, making S/@eaDir (through a work buffer of 4096
+// bytes) and, for the database, the final directory on the way. The length written, or -1 when the
+// arguments are invalid or the share is unknown.
 int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *outArgument, const char *name,
                    bool makeFinalDir)
 {
@@ -48,11 +44,11 @@ int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *ou
         return -1;
     }
     char metadataDir[kSharePathSize];
-    snprintf(metadataDir, sizeof(metadataDir), "%s/%s", share->szPath, kMetadataDir);
+    snprintf(metadataDir, sizeof(metadataDir), "%s", MetadataDirPath(share->szPath).c_str());
     if (VEXOEAMKDir(0, metadataDir) < 0) {
         FILEIDX_LOG("%s:%d VEXOEAMKDir failed, path=%s, code=%d", metadataDir, VLIBCErrGet());
     }
-    snprintf(szOut, static_cast<size_t>(cbOutLen), "%s/%s/%s", share->szPath, kMetadataDir, name);
+    snprintf(szOut, static_cast<size_t>(cbOutLen), "%s", StoragePath(share->szPath, name).c_str());
     if (makeFinalDir && mkdir(szOut, 0777) != 0 && errno != EEXIST) {
         FILEIDX_LOG("%s:%d mkdir failed, path=%s, reason=%m", szOut);
     }

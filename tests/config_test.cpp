@@ -1,6 +1,5 @@
 // The lockable JSON document: locking between processes, loading, and saves that never lose or tear
 // the previous document.
-#include <dirent.h>
 #include <fcntl.h>
 #include <signal.h>
 #include <spawn.h>
@@ -25,8 +24,10 @@ using namespace VEXO::FILEINDEX;
 namespace fileindex_test {
 namespace {
 
-const std::string kDocPath = FILEINDEX_ROOT_DIR "/usr/vexo/etc/fileindex/test.conf";
-const std::string kLockPath = FILEINDEX_ROOT_DIR "/tmp/test.lock";
+// A document of its own beside the folder list, and its lock beside the folder list's.
+const stdfs::path kConfigDir = stdfs::path(FILEINDEX_FOLDER_CONF_PATH).parent_path();
+const std::string kDocPath = kConfigDir / "test.conf";
+const std::string kLockPath = stdfs::path(FILEINDEX_FOLDER_LOCK_PATH).parent_path() / "test.lock";
 
 // A document with the base's own Load and Save, as the status file has.
 class TestDoc : public Config {
@@ -53,14 +54,12 @@ bool LockIsFreeForOthers(const std::string &path)
 std::vector<std::string> TempFilesBesideDoc()
 {
     std::vector<std::string> names;
-    DIR *dir = opendir(FILEINDEX_ROOT_DIR "/usr/vexo/etc/fileindex");
-    while (const dirent *entry = readdir(dir)) {
-        const std::string name = entry->d_name;
+    for (const stdfs::directory_entry &entry : stdfs::directory_iterator(kConfigDir)) {
+        const std::string name = entry.path().filename();
         if (name.rfind("test.conf.", 0) == 0) {
             names.push_back(name);
         }
     }
-    closedir(dir);
     return names;
 }
 
@@ -283,7 +282,7 @@ TEST_F(ConfigTest, ConcurrentWritersLoseNoUpdate)
 {
     constexpr int kWriters = 4;
     constexpr int kAdds = 100;
-    const std::string resultsDir = FILEINDEX_ROOT_DIR "/tmp/";
+    const std::string resultsDir = FILEINDEX_ROOT_DIR "/";
     std::vector<std::unique_ptr<Child>> writers;
     for (int w = 0; w < kWriters; ++w) {
         writers.push_back(std::make_unique<Child>([w, &resultsDir](const Child::Ready &ready) {

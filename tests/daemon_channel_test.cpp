@@ -104,7 +104,7 @@ TEST_F(DaemonChannelTest, StandInDaemonRecordsEachCommandAsOneLine)
               static_cast<char *>(nullptr));
         _exit(127);
     });
-    for (int i = 0; i < 500 && !PathExists(FILEINDEX_DAEMON_SOCKET_PATH); ++i) {
+    for (int i = 0; i < 500 && !stdfs::exists(FILEINDEX_DAEMON_SOCKET_PATH); ++i) {
         usleep(10000);
     }
     Json::Value data;

@@ -2,70 +2,30 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <filesystem>
-#include <fstream>
 #include <functional>
-#include <sstream>
 #include <string>
 #include <thread>
 #include <vector>
 
-#include <gtest/gtest.h>
-#include <json/reader.h>
-#include <json/value.h>
-
-#include "appliance_paths.h"
 #include "platform/error_state.h"
 #include "platform/fs.h"
 #include "platform/monitor_queue.h"
 #include "platform/service.h"
 #include "platform/share_db.h"
+#include "share/storage_paths.h"
+#include "tests/support/sandbox.h"
 
+namespace fileindex_test {
 namespace {
 
-namespace stdfs = std::filesystem;
+using VEXO::FILEINDEX::MetadataDirPath;
 using VEXO::VNOTIFYD::MonitorQueue;
 using VEXO::VNOTIFYD::MONITOR_QUEUE_TYPE_0;
 using VEXO::VNOTIFYD::MONITOR_QUEUE_TYPE_1;
 
-static_assert(sizeof(FILEINDEX_ROOT_DIR) > 1, "the emulation's tests need a sandbox FILEINDEX_ROOT");
-
-const std::string kStateDir = FILEINDEX_EMULATION_STATE_DIR;
 const std::string kVolume = FILEINDEX_ROOT_DIR "/volume1";
 
-std::string ReadFile(const std::string &path)
-{
-    std::ostringstream text;
-    text << std::ifstream(path, std::ios::binary).rdbuf();
-    return text.str();
-}
-
-// Written in place (truncate and write), as a test script would, not through a rename.
-void WriteFile(const std::string &path, const std::string &text)
-{
-    std::ofstream(path, std::ios::binary | std::ios::trunc) << text;
-}
-
-Json::Value ParseJson(const std::string &text)
-{
-    Json::Value value;
-    std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, nullptr)) << text;
-    return value;
-}
-
-std::string State(const std::string &name) { return kStateDir + "/" + name; }
 std::string Vol(const std::string &relative) { return kVolume + "/" + relative; }
-
-std::vector<Json::Value> Journal()
-{
-    std::vector<Json::Value> entries;
-    std::istringstream lines(ReadFile(State("journal.jsonl")));
-    for (std::string line; std::getline(lines, line);) {
-        entries.push_back(ParseJson(line));
-    }
-    return entries;
-}
 
 // True while the process exists and has not exited; a zombie nobody reaped has exited.
 bool ProcessRuns(pid_t pid)
@@ -75,15 +35,13 @@ bool ProcessRuns(pid_t pid)
     return commEnd != std::string::npos && commEnd + 2 < stat.size() && stat[commEnd + 2] != 'Z';
 }
 
-class EmulationTest : public ::testing::Test {
+class EmulationTest : public SandboxTest {
 protected:
     void SetUp() override
     {
-        stdfs::remove_all(kStateDir);
-        stdfs::remove_all(kVolume);
-        stdfs::create_directories(kStateDir);
+        SandboxTest::SetUp();
         stdfs::create_directories(kVolume);
-        WriteFile(State("shares.json"), R"([{"name": "Photo", "path": ")" + Vol("photo") + R"("},
+        WriteFile(StatePath("shares.json"), R"([{"name": "Photo", "path": ")" + Vol("photo") + R"("},
                                             {"name": "photo_raw", "path": ")" + Vol("photo/raw/") + R"("},
                                             {"name": "vault", "path": ")" + Vol("vault") + R"("}])");
     }
@@ -94,7 +52,7 @@ protected:
 TEST_F(EmulationTest, ForcedCallReturnsTheRuleAndDoesNothingElse)
 {
     const std::string marker = Vol("marker");
-    WriteFile(State("service_commands.json"), R"({"indexd": ["/bin/sh", "-c", "touch )" + marker + R"("]})");
+    WriteFile(StatePath("service_commands.json"), R"({"indexd": ["/bin/sh", "-c", "touch )" + marker + R"("]})");
     const MonitorQueue queue(ParseJson(R"({"queue": "/q/one", "config": []})"));
     struct Case {
         const char *op;
@@ -103,17 +61,17 @@ TEST_F(EmulationTest, ForcedCallReturnsTheRuleAndDoesNothingElse)
         std::string untouched;
     };
     const Case cases[] = {
-        {"VLIBServiceStart", [] { return VLIBServiceStart("indexd", 1); }, -1, State("services.json")},
+        {"VLIBServiceStart", [] { return VLIBServiceStart("indexd", 1); }, -1, StatePath("services.json")},
         {"VLIBCExec", [&] { return VLIBCExec("/bin/sh", "-c", ("touch " + marker).c_str(), nullptr); }, -1, marker},
-        {"VEXOEAMKDir", [] { return VEXOEAMKDir(0, Vol("@eaDir").c_str()); }, -1, Vol("@eaDir")},
-        {"VEXOSMBSetSpotlight", [] { return VEXOSMBSetSpotlight(1); }, -1, State("smb.json")},
+        {"VEXOEAMKDir", [] { return VEXOEAMKDir(0, MetadataDirPath(kVolume).c_str()); }, -1, MetadataDirPath(kVolume)},
+        {"VEXOSMBSetSpotlight", [] { return VEXOSMBSetSpotlight(1); }, -1, StatePath("smb.json")},
         {"MonitorQueue::Upsert", [&] { return int(MonitorQueue::Upsert(queue, "fileindex", MONITOR_QUEUE_TYPE_1)); },
-         false, State("monitor_queues.json")},
+         false, StatePath("monitor_queues.json")},
     };
     for (const Case &c : cases) {
         SCOPED_TRACE(c.op);
         const int result = c.journaled.isBool() ? 0 : -1;
-        WriteFile(State("faults.json"), std::string(R"({")") + c.op + R"(": {"result": )" + std::to_string(result) +
+        WriteFile(StatePath("faults.json"), std::string(R"({")") + c.op + R"(": {"result": )" + std::to_string(result) +
                                             R"(, "error": 4660, "file": "faults", "line": 77}})");
         const size_t before = Journal().size();
         EXPECT_EQ(result, c.call());
@@ -138,7 +96,7 @@ TEST_F(EmulationTest, MatchAndAfterDecideWhichCallsAreForced)
     stdfs::create_directories(iso);
     const int real = VEXOGetFSType(kVolume.c_str(), 0);
     ASSERT_GE(real, 0);
-    WriteFile(State("faults.json"), R"({"VEXOGetFSType": [{"match": ")" + iso + R"(", "result": 10},
+    WriteFile(StatePath("faults.json"), R"({"VEXOGetFSType": [{"match": ")" + iso + R"(", "result": 10},
                                                           {"match": ")" + iso + R"(", "result": 99}],
                                         "VEXOEAMKDir": {"match": ")" + x + R"(", "after": 2, "result": -1}})");
     EXPECT_EQ(10, VEXOGetFSType(iso.c_str(), 0));
@@ -153,10 +111,10 @@ TEST_F(EmulationTest, MatchAndAfterDecideWhichCallsAreForced)
     EXPECT_EQ("0 0 0 0 0 -1 forced -1 forced ", outcomes);
 
     // A changed file starts the count afresh; an emptied one forces nothing.
-    WriteFile(State("faults.json"), R"({"VEXOEAMKDir": {"match": ")" + x + R"(", "after": 1, "result": -1}})");
+    WriteFile(StatePath("faults.json"), R"({"VEXOEAMKDir": {"match": ")" + x + R"(", "after": 1, "result": -1}})");
     EXPECT_EQ(0, VEXOEAMKDir(0, x.c_str()));
     EXPECT_EQ(-1, VEXOEAMKDir(0, x.c_str()));
-    WriteFile(State("faults.json"), "{}");
+    WriteFile(StatePath("faults.json"), "{}");
     EXPECT_EQ(real, VEXOGetFSType(iso.c_str(), 0));
     EXPECT_EQ(0, VEXOEAMKDir(0, x.c_str()));
 }
@@ -166,7 +124,7 @@ TEST_F(EmulationTest, JournalHasOneLinePerSideEffectInOrderWithBytesKept)
     const std::string odd = Vol("caf\xe9-\xff\xfe");
     PVEXOSHARE share = nullptr;
     EXPECT_EQ(0, VEXOEAMKDir(3, odd.c_str()));
-    EXPECT_EQ(-1, VEXOEAMKDir(0, Vol("missing/@eaDir").c_str()));
+    EXPECT_EQ(-1, VEXOEAMKDir(0, MetadataDirPath(Vol("missing")).c_str()));
     EXPECT_GE(VEXOGetFSType(kVolume.c_str(), 0), 0);  // queries write nothing
     EXPECT_LT(VEXOShareGet("nobody", &share), 0);
     VLIBCErrSetEx(5, "x.c", 9);
@@ -179,7 +137,7 @@ TEST_F(EmulationTest, JournalHasOneLinePerSideEffectInOrderWithBytesKept)
         {"op": "VLIBCErrSetEx", "args": [5, "x.c", 9], "result": null},
         {"op": "VLIBCExecv", "args": ["/bin/sh", ["sh", "-c", "exit 2"], 4], "result": -1}])");
     expected[0]["args"][1] = odd;
-    expected[1]["args"][1] = Vol("missing/@eaDir");
+    expected[1]["args"][1] = MetadataDirPath(Vol("missing"));
     const std::vector<Json::Value> journal = Journal();
     ASSERT_EQ(expected.size(), journal.size());
     for (unsigned i = 0; i < expected.size(); ++i) {
@@ -219,15 +177,15 @@ TEST_F(EmulationTest, SharesAreFoundByNameAndByPathAndFollowEditsOfTheDatabase)
     EXPECT_EQ(nullptr, share);
 
     // Rewritten in place at once with another text of the same length.
-    WriteFile(State("shares.json"), R"([{"name": "vaulT", "path": "/a/b"}])");
+    WriteFile(StatePath("shares.json"), R"([{"name": "vaulT", "path": "/a/b"}])");
     ASSERT_EQ(0, VEXOShareGet("vault", &share));
     EXPECT_EQ("vaulT /a/b", share->szName + (" " + std::string(share->szPath)));
     VEXOShareFree(share);
 
     // As on a file system with coarse time stamps: the rewrite keeps size, inode and time.
-    const stdfs::file_time_type written = stdfs::last_write_time(State("shares.json"));
-    WriteFile(State("shares.json"), R"([{"name": "vaulX", "path": "/a/b"}])");
-    stdfs::last_write_time(State("shares.json"), written);
+    const stdfs::file_time_type written = stdfs::last_write_time(StatePath("shares.json"));
+    WriteFile(StatePath("shares.json"), R"([{"name": "vaulX", "path": "/a/b"}])");
+    stdfs::last_write_time(StatePath("shares.json"), written);
     EXPECT_LT(VEXOShareGet("vault", &share), 0);
     EXPECT_EQ(0x1400, VLIBCErrGet());
 }
@@ -235,9 +193,9 @@ TEST_F(EmulationTest, SharesAreFoundByNameAndByPathAndFollowEditsOfTheDatabase)
 TEST_F(EmulationTest, ServiceCommandIsLaunchedOnceAndStopEndsIt)
 {
     const std::string pidFile = Vol("indexd.pid");
-    WriteFile(State("service_commands.json"),
+    WriteFile(StatePath("service_commands.json"),
               R"({"indexd": ["/bin/sh", "-c", "echo $$ > )" + pidFile + R"(; exec sleep 60"]})");
-    const auto services = [] { return ParseJson(ReadFile(State("services.json"))); };
+    const auto services = [] { return ParseJson(ReadFile(StatePath("services.json"))); };
 
     ASSERT_EQ(0, VLIBServiceStart("indexd", 0));
     for (int i = 0; i < 500 && ReadFile(pidFile).empty(); ++i) {
@@ -301,16 +259,17 @@ TEST_F(EmulationTest, MonitorQueuesKeepOneRegistrationPerOwnerAndQueue)
     Json::Value expected = ParseJson(R"({"fileindex": {"/q/one": {"type": 0, "description": )" + changed +
                                      R"(}, "/q/two": {"type": 1, "description": )" + second +
                                      R"(}}, "backup": {"/q/one": {"type": 1, "description": )" + first + "}}}");
-    EXPECT_EQ(expected, ParseJson(ReadFile(State("monitor_queues.json"))));
+    EXPECT_EQ(expected, ParseJson(ReadFile(StatePath("monitor_queues.json"))));
 
     ASSERT_TRUE(MonitorQueue::Delete("/q/one", "fileindex", MONITOR_QUEUE_TYPE_1));
     ASSERT_TRUE(MonitorQueue::Delete("/q/one", "fileindex", MONITOR_QUEUE_TYPE_1));
     ASSERT_TRUE(MonitorQueue::Delete("/q/one", "nobody", MONITOR_QUEUE_TYPE_0));
     expected["fileindex"].removeMember("/q/one");
-    EXPECT_EQ(expected, ParseJson(ReadFile(State("monitor_queues.json"))));
+    EXPECT_EQ(expected, ParseJson(ReadFile(StatePath("monitor_queues.json"))));
     ASSERT_TRUE(MonitorQueue::Delete("/q/two", "fileindex", MONITOR_QUEUE_TYPE_1));
     expected.removeMember("fileindex");  // an owner goes with its last registration
-    EXPECT_EQ(expected, ParseJson(ReadFile(State("monitor_queues.json"))));
+    EXPECT_EQ(expected, ParseJson(ReadFile(StatePath("monitor_queues.json"))));
 }
 
 }  // namespace
+}  // namespace fileindex_test

@@ -10,6 +10,7 @@
 #include "fileindex/error.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
+#include "share/storage_paths.h"
 #include "tests/support/child.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/sandbox.h"
@@ -25,8 +26,9 @@ protected:
     {
         SandboxTest::SetUp();
         DeclareShares("volume1/photo");
-        MakeDirs(SharePath("photo") + "/@eaDir");
-        m_queue = SharePath("photo") + "/@eaDir/VEXO@file_index_queue";
+        stdfs::create_directories(MetadataDirPath(SharePath("photo")));
+        m_queue = StoragePath(SharePath("photo"), kQueueFileName);
+        m_companion = QueueCompanionPath(m_queue);
         m_folder = SharePath("photo") + "/holiday";
         LOG_LEVEL = LOG_ERR;
     }
@@ -39,6 +41,7 @@ protected:
     }
 
     std::string m_queue;
+    std::string m_companion;
     std::string m_folder;
 };
 
@@ -52,7 +55,7 @@ TEST_F(EventQueueTest, EventIsAppendedAsOneLineToANewQueueFile)
     struct stat st;
     ASSERT_EQ(stat(m_queue.c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0644u);
-    EXPECT_FALSE(PathExists(m_queue + ".tmp")) << "the companion file is never created";
+    EXPECT_FALSE(stdfs::exists(m_companion)) << "the companion file is never created";
 }
 
 TEST_F(EventQueueTest, PendingReindexOfThePathMakesAnyNewEventUnnecessary)
@@ -75,11 +78,11 @@ TEST_F(EventQueueTest, PendingReindexOfThePathMakesAnyNewEventUnnecessary)
     for (const auto &c : cases) {
         SCOPED_TRACE(c.queue + " | " + c.companion);
         WriteFile(m_queue, c.queue);
-        std::remove((m_queue + ".tmp").c_str());
+        stdfs::remove(m_companion);
         if (!c.companion.empty()) {
-            WriteFile(m_queue + ".tmp", c.companion);
+            WriteFile(m_companion, c.companion);
         }
-        EXPECT_EQ(HasQueuedReindexEvent(m_folder, m_queue) || HasQueuedReindexEvent(m_folder, m_queue + ".tmp"),
+        EXPECT_EQ(HasQueuedReindexEvent(m_folder, m_queue) || HasQueuedReindexEvent(m_folder, m_companion),
                   c.covered);
         ASSERT_TRUE(AddCustomEvent(kEventFolderSettingChanged, m_folder, Report()));
         const size_t lines = static_cast<size_t>(std::count(c.queue.begin(), c.queue.end(), '\n'));
@@ -113,7 +116,7 @@ TEST_F(EventQueueTest, BusyQueueDropsTheEventAndReportsSuccess)
 
 TEST_F(EventQueueTest, EventThatCannotBeWrittenMarksTheShareForReindex)
 {
-    MakeDirs(m_queue);  // a directory where the queue file belongs cannot be opened for writing
+    stdfs::create_directories(m_queue);  // a directory where the queue file belongs cannot be opened for writing
     EXPECT_FALSE(AddCustomEvent(kEventFolderSettingChanged, m_folder, Report()));
     EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("photo"));
     EXPECT_TRUE(LogCapture::Lines().empty());

@@ -7,6 +7,7 @@
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/index_mgr.h"
+#include "share/storage_paths.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/sandbox.h"
 
@@ -24,7 +25,7 @@ protected:
         ErrorHandler::SetError(FILEIDX_ERR_NONE);
     }
 
-    static std::string Queue(const std::string &share) { return SharePath(share) + "/@eaDir/VEXO@file_index_queue"; }
+    static std::string Queue(const std::string &share) { return StoragePath(SharePath(share), kQueueFileName); }
 };
 
 TEST_F(ShareStorageTest, InvalidArgumentsNameTheFirstFailedCheck)
@@ -63,15 +64,15 @@ TEST_F(ShareStorageTest, QueuePathMakesTheMetadataDirectoryButNotTheQueue)
     const int length = FILEIDXQueuePathGet("PHOTO", buffer, sizeof(buffer));
     EXPECT_EQ(buffer, Queue("photo"));
     EXPECT_EQ(length, static_cast<int>(strlen(buffer)));
-    EXPECT_TRUE(PathExists(SharePath("photo") + "/@eaDir"));
-    EXPECT_FALSE(PathExists(buffer));
+    EXPECT_TRUE(stdfs::exists(MetadataDirPath(SharePath("photo"))));
+    EXPECT_FALSE(stdfs::exists(buffer));
     EXPECT_TRUE(LogCapture::Lines().empty());
 }
 
 TEST_F(ShareStorageTest, DatabasePathMakesTheDirectoryOnceAndQuietlyAfterwards)
 {
     char buffer[4096];
-    const std::string database = SharePath("photo") + "/@eaDir/VEXO@.fileindexdb";
+    const std::string database = StoragePath(SharePath("photo"), kDatabaseDirName);
     EXPECT_EQ(FILEIDXDBPathGet("photo", buffer, sizeof(buffer)), static_cast<int>(database.size()));
     EXPECT_EQ(buffer, database);
     struct stat st;
@@ -99,12 +100,12 @@ TEST_F(ShareStorageTest, FailuresOnTheWayAreLoggedAndUnknownSharesRefused)
     // A file where the metadata directory belongs: neither directory can be made, and the path
     // is still handed out.
     LogCapture::Clear();
-    WriteFile(SharePath("video") + "/@eaDir", "");
-    const std::string database = SharePath("video") + "/@eaDir/VEXO@.fileindexdb";
+    WriteFile(MetadataDirPath(SharePath("video")), "");
+    const std::string database = StoragePath(SharePath("video"), kDatabaseDirName);
     EXPECT_EQ(FILEIDXDBPathGet("video", buffer, sizeof(buffer)), static_cast<int>(database.size()));
     const std::vector<std::string> messages = LogCapture::Messages();
     ASSERT_EQ(messages.size(), 2u);
-    EXPECT_EQ(messages[0].rfind("VEXOEAMKDir failed, path=" + SharePath("video") + "/@eaDir, code=", 0), 0u);
+    EXPECT_EQ(messages[0].rfind("VEXOEAMKDir failed, path=" + MetadataDirPath(SharePath("video")) + ", code=", 0), 0u);
     EXPECT_EQ(messages[1], "mkdir failed, path=" + database + ", reason=Not a directory");
 }
 
@@ -171,7 +172,7 @@ TEST_F(MonitorRegistrationTest, DeleteRemovesTheShareRegistration)
     ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg("video"));
     ASSERT_TRUE(IndexMgr::DeleteVNotifydCfg("photo"));
     EXPECT_EQ(JournalOf("MonitorQueue::Delete").at(0)["args"], ParseJson("[\"" + Queue("photo") + "\", \"fileindex\", 1]"));
-    const Json::Value registered = ParseJson(ReadFile(FILEINDEX_EMULATION_STATE_DIR "/monitor_queues.json"));
+    const Json::Value registered = ParseJson(ReadFile(StatePath("monitor_queues.json")));
     EXPECT_EQ(registered["fileindex"].getMemberNames(), std::vector<std::string>{Queue("video")});
 }
 

@@ -5,21 +5,18 @@
 // monitoring, indexing paused and resumed, a share marked out of space and revived, and events
 // queued. Every command that reaches the stand-in daemon is printed at the end.
 #include <fcntl.h>
-#include <ftw.h>
 #include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cstdio>
-#include <fstream>
+#include <filesystem>
 #include <iostream>
-#include <sstream>
 #include <string>
 
-#include <json/json.h>
-
 #include "appliance_paths.h"
+#include "config/file_io.h"
+#include "config/json_io.h"
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/folder.h"
@@ -31,6 +28,8 @@
 using namespace VEXO::FILEINDEX;
 
 namespace {
+
+namespace stdfs = std::filesystem;
 
 const std::string kRoot = FILEINDEX_ROOT_DIR;
 const std::string kState = FILEINDEX_EMULATION_STATE_DIR;
@@ -46,43 +45,11 @@ void Show(const std::string &label, const std::string &value)
     std::cout << "   " << label << ": " << value << "\n";
 }
 
-std::string Compact(const Json::Value &value)
-{
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, value);
-}
-
 std::string ReadText(const std::string &path)
 {
-    std::ifstream in(path, std::ios::binary);
-    std::ostringstream text;
-    text << in.rdbuf();
-    return text.str();
-}
-
-void WriteText(const std::string &path, const std::string &text)
-{
-    std::ofstream(path, std::ios::binary | std::ios::trunc) << text;
-}
-
-void MakeDirs(const std::string &path)
-{
-    for (size_t slash = path.find('/', 1);; slash = path.find('/', slash + 1)) {
-        mkdir(path.substr(0, slash).c_str(), 0755);
-        if (slash == std::string::npos) {
-            return;
-        }
-    }
-}
-
-int RemoveEntry(const char *path, const struct stat *, int, struct FTW *ftw)
-{
-    if (ftw->level > 0) {
-        remove(path);
-    }
-    return 0;
+    std::string text;
+    ReadWholeFile(path, text);
+    return text;
 }
 
 // A fresh appliance: configuration, lock and run directories, the emulated share database, the
@@ -93,12 +60,17 @@ bool SetUpAppliance(const std::string &standInDaemon)
         std::cerr << "this demo needs a build with a sandbox FILEINDEX_ROOT\n";
         return false;
     }
-    nftw(kRoot.c_str(), RemoveEntry, 32, FTW_DEPTH | FTW_PHYS);
-    for (const char *dir : {"/tmp", "/usr/vexo/etc/fileindex", "/usr/vexo/bin", "/var/run", "/volume1/photo/holiday",
-                            "/volume1/video", "/volume2/music"}) {
-        MakeDirs(kRoot + dir);
+    stdfs::create_directories(kRoot);
+    for (const stdfs::directory_entry &entry : stdfs::directory_iterator(kRoot)) {
+        stdfs::remove_all(entry.path());
     }
-    MakeDirs(kState);
+    for (const char *file : {FILEINDEX_APPLIANCE_FILES}) {
+        stdfs::create_directories(stdfs::path(file).parent_path());
+    }
+    stdfs::create_directories(kState);
+    for (const char *dir : {"/volume1/photo/holiday", "/volume1/video", "/volume2/music"}) {
+        stdfs::create_directories(kRoot + dir);
+    }
     Json::Value shares(Json::arrayValue);
     for (const char *location : {"volume1/photo", "volume1/video", "volume2/music"}) {
         Json::Value share;
@@ -106,14 +78,14 @@ bool SetUpAppliance(const std::string &standInDaemon)
         share["path"] = kRoot + "/" + location;
         shares.append(share);
     }
-    WriteText(kState + "/shares.json", Compact(shares));
-    WriteText(FILEINDEX_NOTIFY_TOOL_PATH, "#!/bin/sh\nexit 0\n");
+    ReplaceFileAtomically(kState + "/shares.json", toString(shares));
+    ReplaceFileAtomically(FILEINDEX_NOTIFY_TOOL_PATH, "#!/bin/sh\nexit 0\n");
     chmod(FILEINDEX_NOTIFY_TOOL_PATH, 0755);
     Json::Value commands;
     commands["fileindexd"].append(standInDaemon);
     commands["fileindexd"].append("--output");
     commands["fileindexd"].append(kCommandsFile);
-    WriteText(kState + "/service_commands.json", Compact(commands));
+    ReplaceFileAtomically(kState + "/service_commands.json", toString(commands));
     return true;
 }
 
@@ -164,10 +136,10 @@ int main(int, char **argv)
                                         R"({"path":"/video","name":"Films","video":true})",
                                         R"({"path":"/photo/holiday","document":true})"}) {
                 Json::Value setting;
-                Json::Reader().parse(request, setting);
+                fromString(setting, request);
                 Json::Value report;
                 folders.Upsert(report, setting);
-                Show("upsert " + std::string(request), "change report " + Compact(report));
+                Show("upsert " + std::string(request), "change report " + toString(report));
             }
             Show("saved", folders.Save() ? "yes" : "no");
         }
@@ -178,7 +150,7 @@ int main(int, char **argv)
     Step("Lookups and queries");
     Json::Value record;
     IndexMgr::Get(record, "/photo/holiday");
-    Show("IndexMgr::Get(/photo/holiday)", Compact(record));
+    Show("IndexMgr::Get(/photo/holiday)", toString(record));
     Show("IsPathIndexed(/photo/holiday/2024)", IndexMgr::IsPathIndexed("/photo/holiday/2024") ? "yes" : "no");
     Show("IsPathIndexed(/photo/holiday2)", IndexMgr::IsPathIndexed("/photo/holiday2") ? "yes" : "no");
     Show("IsPathContainIndexed(/photo)", IndexMgr::IsPathContainIndexed("/photo") ? "yes" : "no");

@@ -15,6 +15,7 @@
 #include "faults.h"
 #include "journal.h"
 #include "json_text.h"
+#include "share/storage_paths.h"
 #include "shares.h"
 
 namespace VEXO {
@@ -65,7 +66,7 @@ constexpr MagicCode kFsTypes[] = {
 };
 
 // The names the platform keeps its own metadata under, hidden from users and from indexing.
-constexpr const char *kHiddenDirNames[] = {"@eaDir"};
+constexpr const char *kHiddenDirNames[] = {FILEINDEX::kMetadataDirName};
 
 int CodeOfMagic(unsigned long magic)
 {

@@ -1,15 +1,12 @@
 #include "tests/support/sandbox.h"
 
-#include <ftw.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <fstream>
 #include <sstream>
 
-#include <json/reader.h>
-#include <json/writer.h>
-
+#include "config/file_io.h"
+#include "config/json_io.h"
 #include "tests/support/log_capture.h"
 
 namespace fileindex_test {
@@ -19,38 +16,14 @@ std::vector<std::pair<std::string, std::string>> SandboxTest::s_shares;
 namespace {
 
 const std::string kRoot = FILEINDEX_ROOT_DIR;
-const std::string kStateDir = FILEINDEX_EMULATION_STATE_DIR;
-
-int RemoveEntry(const char *path, const struct stat *, int, struct FTW *ftw)
-{
-    if (ftw->level > 0) {
-        remove(path);
-    }
-    return 0;
-}
-
-void WipeRoot()
-{
-    ASSERT_FALSE(kRoot.empty()) << "tests need a sandbox root";
-    nftw(kRoot.c_str(), RemoveEntry, 32, FTW_DEPTH | FTW_PHYS);
-}
-
-std::string Compact(const Json::Value &value)
-{
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "";
-    builder["emitUTF8"] = true;
-    return Json::writeString(builder, value);
-}
 
 }  // namespace
 
 std::string ReadFile(const std::string &path)
 {
-    std::ifstream in(path, std::ios::binary);
-    std::ostringstream content;
-    content << in.rdbuf();
-    return content.str();
+    std::string content;
+    VEXO::FILEINDEX::ReadWholeFile(path, content);
+    return content;
 }
 
 void WriteFile(const std::string &path, const std::string &content)
@@ -60,41 +33,26 @@ void WriteFile(const std::string &path, const std::string &content)
     ASSERT_TRUE(out.good()) << path;
 }
 
-bool PathExists(const std::string &path)
-{
-    struct stat st;
-    return lstat(path.c_str(), &st) == 0;
-}
-
-void MakeDirs(const std::string &path)
-{
-    for (size_t slash = path.find('/', 1); ; slash = path.find('/', slash + 1)) {
-        mkdir(path.substr(0, slash).c_str(), 0755);
-        if (slash == std::string::npos) {
-            break;
-        }
-    }
-}
-
 Json::Value ParseJson(const std::string &text)
 {
-    Json::CharReaderBuilder builder;
-    std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
     Json::Value value;
-    std::string errors;
-    EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, &errors)) << errors << text;
+    EXPECT_TRUE(VEXO::FILEINDEX::fromString(value, text)) << text;
     return value;
 }
 
 void SandboxTest::SetUp()
 {
-    WipeRoot();
+    ASSERT_FALSE(kRoot.empty()) << "tests need a sandbox root";
+    umask(0);
+    stdfs::create_directories(kRoot);
+    for (const stdfs::directory_entry &entry : stdfs::directory_iterator(kRoot)) {
+        stdfs::remove_all(entry.path());
+    }
     s_shares.clear();
-    MakeDirs(HostPath("/tmp"));
-    MakeDirs(HostPath("/usr/vexo/etc/fileindex"));
-    MakeDirs(HostPath("/usr/vexo/bin"));
-    MakeDirs(HostPath("/var/run"));
-    MakeDirs(kStateDir);
+    for (const char *file : {FILEINDEX_APPLIANCE_FILES}) {
+        stdfs::create_directories(stdfs::path(file).parent_path());
+    }
+    stdfs::create_directories(FILEINDEX_EMULATION_STATE_DIR);
     // The administrators' notification tool: succeeds and does nothing.
     WriteFile(FILEINDEX_NOTIFY_TOOL_PATH, "#!/bin/sh\nexit 0\n");
     chmod(FILEINDEX_NOTIFY_TOOL_PATH, 0755);
@@ -114,7 +72,7 @@ void SandboxTest::DeclareShares(const std::string &declaration)
         ASSERT_NE(slash, std::string::npos) << "expected volume/share, got " << word;
         const std::string name = location.substr(slash + 1);
         const std::string path = HostPath("/" + location);
-        MakeDirs(path);
+        stdfs::create_directories(path);
         s_shares.emplace_back(name, path);
 
         Json::Value share;
@@ -126,7 +84,7 @@ void SandboxTest::DeclareShares(const std::string &declaration)
         }
         database.append(share);
     }
-    WriteFile(kStateDir + "/shares.json", Compact(database));
+    WriteFile(StatePath("shares.json"), VEXO::FILEINDEX::toString(database));
 }
 
 std::string SandboxTest::SharePath(const std::string &share)
@@ -145,17 +103,21 @@ std::string SandboxTest::HostPath(const std::string &appliancePath)
     return kRoot + appliancePath;
 }
 
+std::string SandboxTest::StatePath(const std::string &name)
+{
+    return FILEINDEX_EMULATION_STATE_DIR "/" + name;
+}
+
 void SandboxTest::SetFaults(const Json::Value &faults)
 {
-    WriteFile(kStateDir + "/faults.json", Compact(faults));
+    WriteFile(StatePath("faults.json"), VEXO::FILEINDEX::toString(faults));
 }
 
 std::vector<Json::Value> SandboxTest::Journal()
 {
     std::vector<Json::Value> entries;
-    std::istringstream lines(ReadFile(kStateDir + "/journal.jsonl"));
-    std::string line;
-    while (std::getline(lines, line)) {
+    std::istringstream lines(ReadFile(StatePath("journal.jsonl")));
+    for (std::string line; std::getline(lines, line);) {
         entries.push_back(ParseJson(line));
     }
     return entries;

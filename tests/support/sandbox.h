@@ -1,8 +1,10 @@
-// A fresh appliance under the build's sandbox root for every test: the configuration, lock and run
-// directories, the emulated platform's state directory, and the volumes and shares a test declares.
+// A fresh appliance under the build's sandbox root for every test: the directories of the fixed
+// appliance files, the emulated platform's state directory, and the volumes and shares a test
+// declares. Every file mode a test reads is the one the code asked for: the umask is 0.
 #ifndef FILEINDEX_TESTS_SANDBOX_H
 #define FILEINDEX_TESTS_SANDBOX_H
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -12,6 +14,8 @@
 #include "appliance_paths.h"
 
 namespace fileindex_test {
+
+namespace stdfs = std::filesystem;
 
 class SandboxTest : public ::testing::Test {
 protected:
@@ -26,6 +30,8 @@ protected:
     static std::string SharePath(const std::string &share);
     // Root-prefixed host path of an appliance path such as "/volume1/photo".
     static std::string HostPath(const std::string &appliancePath);
+    // <state directory>/<name>: a file of the emulated platform's state.
+    static std::string StatePath(const std::string &name);
 
     // Forces platform results through the emulation's faults.json.
     static void SetFaults(const Json::Value &faults);
@@ -38,12 +44,11 @@ private:
     static std::vector<std::pair<std::string, std::string>> s_shares;
 };
 
-// Small file helpers for assertions.
+// Small file helpers for assertions. WriteFile writes in place (truncate and write), as a script
+// editing the file would; ReadFile gives "" for a file that cannot be read.
 std::string ReadFile(const std::string &path);
 void WriteFile(const std::string &path, const std::string &content);
-bool PathExists(const std::string &path);
-void MakeDirs(const std::string &path);
-Json::Value ParseJson(const std::string &text);  // fails the test on invalid text
+Json::Value ParseJson(const std::string &text);  // fails the test on anything but strict JSON text
 
 }  // namespace fileindex_test
 
