@@ -109,7 +109,7 @@ VEXOEMU_API bool MonitorQueue::Upsert(const MonitorQueue &queue, const std::stri
                                       _tag_monitor_queue_type_ type)
 {
     return Guarded(false, [&] {
-        const Json::Value &description = queue.Description();
+        const Json::Value &description = queue.m_description;
         const Json::Value args = CallArgs(description, owner, type);
         const char *queuePath = QueueOf(description);
         if (const std::optional<int> forced = ForcedResult("MonitorQueue::Upsert", queuePath)) {
