@@ -7,10 +7,6 @@
 namespace VEXO {
 namespace FILEINDEX {
 
-// Event kinds the library itself queues.
-constexpr unsigned kEventReindex = 0x10000;
-constexpr unsigned kEventFolderSettingChanged = 0x20000;
-
 // True when queueFile holds a pending reindex record ({"event": 65536, "path": path}) for exactly
 // path. Lines that are not such records are skipped; a missing file holds none. A file that exists
 // but cannot be read logs "Failed to open queue=<file>, reason=<errno text>" and holds none.

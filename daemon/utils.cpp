@@ -9,6 +9,7 @@
 #include "config/json_io.h"
 #include "config/log.h"
 #include "daemon/event_queue.h"
+#include "daemon/queue_record.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
@@ -80,12 +81,8 @@ bool HasQueuedReindexEvent(const std::string &path, const std::string &queueFile
     }
     bool found = false;
     const bool read = ForEachLine(queueFile, [&](const std::string &line) {
-        Json::Value record;
-        if (!fromString(record, line) || !record.isObject() || !record.isMember("event") || !record.isMember("path") ||
-            !record["event"].isConvertibleTo(Json::uintValue) || !record["path"].isString()) {
-            return true;
-        }
-        found = record["event"].asUInt() == kEventReindex && record["path"].asString() == path;
+        QueueRecord record;
+        found = ParseQueueRecord(line, record) && record.event == kEventReindex && record.path == path;
         return !found;
     });
     if (!read) {

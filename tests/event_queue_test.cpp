@@ -7,6 +7,7 @@
 #include <sstream>
 
 #include "daemon/event_queue.h"
+#include "daemon/queue_record.h"
 #include "fileindex/error.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"

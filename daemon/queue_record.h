@@ -1,0 +1,31 @@
+// One line of a share's event queue file as the library reads it: {"event": kind, "path": path,
+// ...}, with "path_old" added by moves. The event queue's reindex search and the progress report
+// judge every line here, so that both skip exactly the same lines.
+#ifndef FILEINDEX_DAEMON_QUEUE_RECORD_H
+#define FILEINDEX_DAEMON_QUEUE_RECORD_H
+
+#include <string>
+
+namespace VEXO {
+namespace FILEINDEX {
+
+// Event kinds the library reads or queues itself; the notification daemon writes others too.
+constexpr unsigned kEventMove = 0x100;
+constexpr unsigned kEventReindex = 0x10000;
+constexpr unsigned kEventFolderSettingChanged = 0x20000;
+
+struct QueueRecord {
+    unsigned event = 0;
+    std::string path;
+    std::string pathOld;  // "path_old" of a move when it is a string; empty otherwise
+};
+
+// True when line is one JSON object with an "event" the JSON library can convert to an unsigned
+// integer and a string "path"; record is then filled. False for anything else (a line being
+// appended, a foreign record), record unspecified.
+bool ParseQueueRecord(const std::string &line, QueueRecord &record);
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
+
+#endif
