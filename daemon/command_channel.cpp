@@ -7,11 +7,10 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdint>
 #include <cstring>
 
 #include "appliance_paths.h"
-#include "config/json_io.h"
+#include "daemon/command_frame.h"
 #include "fileindex/utils.h"
 
 namespace VEXO {
@@ -85,13 +84,10 @@ bool SendCammandToDaemon(const std::string &type, const Json::Value &data)
     if (fd < 0) {
         return false;
     }
-    Json::Value command(Json::objectValue);
-    command["type"] = Json::Value(type);
-    command["data"] = data;
-    const std::string text = toString(command);
-    const uint32_t length = static_cast<uint32_t>(text.size() + 1);
-    const bool sent = WriteLoop(fd, reinterpret_cast<const char *>(&length), sizeof(length)) &&
-                      WriteLoop(fd, text.c_str(), text.size() + 1);
+    // The length and the rest of the frame go out as two separate writes.
+    const std::string frame = EncodeCommandFrame(type, data);
+    const bool sent = WriteLoop(fd, frame.data(), kFrameLengthSize) &&
+                      WriteLoop(fd, frame.data() + kFrameLengthSize, frame.size() - kFrameLengthSize);
     close(fd);
     return sent;
 }
