@@ -17,7 +17,8 @@ bool ForEachLine(const std::string &path, const std::function<bool(const std::st
 
 // Writes content to a temporary file beside path (mode 0644), syncs it, renames it over path and
 // syncs the directory, so that a reader without any lock sees either the old or the new content.
-// On any failure the temporary file is removed and path keeps its previous content. Temporary files left behind by killed processes are swept by the next replacement.
+// On any failure the temporary file is removed and path keeps its previous content. Temporary files
+// left behind by killed processes are swept by the next replacement.
 bool ReplaceFileAtomically(const std::string &path, const std::string &content);
 
 }  // namespace FILEINDEX

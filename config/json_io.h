@@ -21,8 +21,8 @@ std::string toString(const Json::Value &value);
 
 // Reads and parses a whole file. False when it cannot be read or does not parse.
 bool fromFile(Json::Value &value, const std::string &path);
-// Replaces the file with toString(value) atomically (see atomic_file.h). False when it cannot be
-// written; the previous file is then left as it was.
+// Replaces the file with toString(value) atomically (ReplaceFileAtomically of file_io.h). False when
+// it cannot be written; the previous file is then left as it was.
 bool toFile(const Json::Value &value, const std::string &path);
 
 }  // namespace FILEINDEX

@@ -45,11 +45,10 @@ bool Folders::Load()
 
 bool Folders::Save()
 {
+    // An object, so AddToJson adds every record.
     m_jsConfig = Json::Value(Json::objectValue);
     for (const auto &entry : m_folders) {
-        if (!entry.second.AddToJson(m_jsConfig)) {
-            return false;
-        }
+        entry.second.AddToJson(m_jsConfig);
     }
     return SaveJson();
 }

@@ -16,12 +16,10 @@ const char kNoSpace[] = "no_space";
 const char kNeedReindex[] = "need_reindex";
 constexpr long long kNotPaused = -1;
 
-// Adds or removes share in the per-share mark object key. Returns whether share was newly added.
+// Adds or removes share in the per-share mark object key, which is created as null when absent (any
+// other value is left as it is). Returns whether share was newly added.
 bool SetShareMark(Json::Value &document, const char *key, const std::string &share, bool flag)
 {
-    if (!document.isMember(key) || !document[key].isObject()) {
-        document[key];  // creates key as null when absent; any other value is left as it is
-    }
     Json::Value &marks = document[key];
     if (!flag) {
         marks.removeMember(share);

@@ -28,7 +28,8 @@ FILEINDEX_EXPORT bool GetFullPath(std::string &fullPath, const std::string &path
 
 // Finds the share holding a full path. Failure: false, error 2 (FILEIDX_ERR_PATH),
 // "VEXOShareNamePathGet failed, path=<path>"; the outputs are untouched.
-FILEINDEX_EXPORT bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath, const std::string &fullPath);
+FILEINDEX_EXPORT bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath,
+                                                 const std::string &fullPath);
 
 // Replaces the first component of a share-relative path: ("/old/a", "new") gives "/new/a". The
 // result always begins with "/"; an empty path gives "".

@@ -12,7 +12,7 @@ namespace fileindex_test {
 
 enum class Syscall { kChmod, kFsync, kRename };
 
-// The next calls of the given kind fail with errnoValue until Disarm (or the guard's end).
+// While the guard exists, every call of the given kind fails with errnoValue.
 class SyscallFault {
 public:
     SyscallFault(Syscall call, int errnoValue);
