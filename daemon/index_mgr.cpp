@@ -2,10 +2,10 @@
 #include <memory>
 
 #include "config/log.h"
-#include "fileindex/fileidx.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
 #include "platform/monitor_queue.h"
+#include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
 namespace VEXO {
@@ -19,14 +19,13 @@ const char kMonitorOwner[] = "fileindex";
 constexpr VNOTIFYD::_tag_monitor_queue_type_ kMonitorQueueType = VNOTIFYD::MONITOR_QUEUE_TYPE_1;
 // Change events the indexing daemon wants to hear of, as the notification daemon numbers them.
 constexpr int kMonitorMask = 0xFFCE;
-constexpr int kPathSize = 4096;
 
 }  // namespace
 
 bool IndexMgr::UpsertVNotifydCfg(const std::string &share)
 {
-    char queuePath[kPathSize] = {};
-    if (FILEIDXQueuePathGet(share.c_str(), queuePath, kPathSize) < 0) {
+    std::string queuePath;
+    if (!GetQueuePath(queuePath, share)) {
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return false;
     }
@@ -70,8 +69,8 @@ bool IndexMgr::UpsertVNotifydCfg(const std::string &share)
 
 bool IndexMgr::DeleteVNotifydCfg(const std::string &share)
 {
-    char queuePath[kPathSize] = {};
-    if (FILEIDXQueuePathGet(share.c_str(), queuePath, kPathSize) < 0) {
+    std::string queuePath;
+    if (!GetQueuePath(queuePath, share)) {
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return false;
     }

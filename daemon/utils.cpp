@@ -10,10 +10,9 @@
 #include "config/log.h"
 #include "daemon/event_queue.h"
 #include "daemon/queue_record.h"
-#include "fileindex/fileidx.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
-#include "platform/share_db.h"
+#include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
 namespace VEXO {
@@ -21,8 +20,6 @@ namespace FILEINDEX {
 
 namespace {
 
-constexpr int kShareNameSize = 492;
-constexpr int kPathSize = 4096;
 constexpr int kLockAttempts = 3;
 // A queue file the library creates is readable by everyone and written by its owner (root).
 constexpr mode_t kQueueFileMode = 0644;
@@ -93,19 +90,16 @@ bool HasQueuedReindexEvent(const std::string &path, const std::string &queueFile
 
 bool AddCustomEvent(const int &event, const std::string &path, const Json::Value &data)
 {
-    char shareBuffer[kShareNameSize] = {};
-    char sharePathBuffer[kPathSize] = {};
-    if (VEXOShareNamePathGet(path.c_str(), shareBuffer, kShareNameSize, sharePathBuffer, kPathSize) < 0) {
-        FILEIDX_LOG("%s:%d VEXOShareNamePathGet failed, path=%s", path.c_str());
+    std::string share;
+    std::string sharePath;
+    if (!FindShareOfFullPath(share, sharePath, path)) {
         return FallBackToReindex(std::string());
     }
-    const std::string share = shareBuffer;
-    char queueBuffer[kPathSize] = {};
-    if (FILEIDXQueuePathGet(share.c_str(), queueBuffer, kPathSize) < 0) {
+    std::string queue;
+    if (!GetQueuePath(queue, share)) {
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return FallBackToReindex(share);
     }
-    const std::string queue = queueBuffer;
     if (HasQueuedReindexEvent(path, queue) || HasQueuedReindexEvent(path, QueueCompanionPath(queue))) {
         return true;
     }

@@ -12,6 +12,7 @@
 #include "platform/error_state.h"
 #include "platform/fs.h"
 #include "platform/share_db.h"
+#include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
 namespace VEXO {
@@ -89,17 +90,35 @@ bool GetFullPath(std::string &fullPath, const std::string &path)
     return true;
 }
 
-bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath, const std::string &fullPath)
+bool FindShareOfFullPath(std::string &share, std::string &sharePath, const std::string &fullPath)
 {
     char nameBuffer[kShareNameSize] = {};
     char pathBuffer[kSharePathSize] = {};
     if (VEXOShareNamePathGet(fullPath.c_str(), nameBuffer, kShareNameSize, pathBuffer, kSharePathSize) < 0) {
         FILEIDX_LOG("%s:%d VEXOShareNamePathGet failed, path=%s", fullPath.c_str());
-        ErrorHandler::SetError(FILEIDX_ERR_PATH);
         return false;
     }
     share = nameBuffer;
     sharePath = pathBuffer;
+    return true;
+}
+
+bool GetShareNamePathByFullPath(std::string &share, std::string &sharePath, const std::string &fullPath)
+{
+    if (!FindShareOfFullPath(share, sharePath, fullPath)) {
+        ErrorHandler::SetError(FILEIDX_ERR_PATH);
+        return false;
+    }
+    return true;
+}
+
+bool GetQueuePath(std::string &queuePath, const std::string &share)
+{
+    char buffer[kSharePathSize] = {};
+    if (FILEIDXQueuePathGet(share.c_str(), buffer, kSharePathSize) < 0) {
+        return false;
+    }
+    queuePath = buffer;
     return true;
 }
 

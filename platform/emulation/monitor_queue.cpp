@@ -47,35 +47,6 @@ const char *QueueOf(const Json::Value &description)
     return queue.isString() ? queue.asCString() : nullptr;
 }
 
-// Applies change to the registrations under the lock and saves them. False, with the error state
-// set, when the file cannot be read or written.
-template <typename Change>
-bool ChangeRegistrations(Change &&change)
-{
-    StateLock lock;
-    if (!lock.Held()) {
-        EMU_SET_ERROR(kErrStateFile);
-        return false;
-    }
-    const std::string path = StatePath("monitor_queues.json");
-    Json::Value registrations;
-    const ReadStatus status = ReadJsonFile(path, registrations);
-    if (status == ReadStatus::kMissing) {
-        registrations = Json::Value(Json::objectValue);
-    } else if (status == ReadStatus::kBad || !registrations.isObject()) {
-        EMU_SET_ERROR(kErrStateFile);
-        return false;
-    }
-    if (!change(registrations)) {
-        return true;  // nothing to change
-    }
-    if (!ReplaceJsonFile(path, registrations)) {
-        EMU_SET_ERROR(kErrStateFile);
-        return false;
-    }
-    return true;
-}
-
 Json::Value CallArgs(const Json::Value &first, const std::string &owner, int type)
 {
     Json::Value args(Json::arrayValue);
@@ -120,7 +91,7 @@ VEXOEMU_API bool MonitorQueue::Upsert(const MonitorQueue &queue, const std::stri
         if (owner.empty() || queuePath == nullptr) {
             EMU_SET_ERROR(kErrBadArgument);
         } else {
-            result = ChangeRegistrations([&](Json::Value &registrations) {
+            result = EditStateObject("monitor_queues.json", [&](Json::Value &registrations) {
                 Json::Value entry(Json::objectValue);
                 entry["type"] = static_cast<int>(type);
                 entry["description"] = description;
@@ -151,7 +122,7 @@ VEXOEMU_API bool MonitorQueue::Delete(const std::string &queuePath, const std::s
         if (owner.empty() || queuePath.empty()) {
             EMU_SET_ERROR(kErrBadArgument);
         } else {
-            result = ChangeRegistrations([&](Json::Value &registrations) {
+            result = EditStateObject("monitor_queues.json", [&](Json::Value &registrations) {
                 const Json::Value *queues = registrations.find(owner.data(), owner.data() + owner.size());
                 if (queues == nullptr || !queues->isObject() || !queues->isMember(queuePath)) {
                     return false;

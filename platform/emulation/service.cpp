@@ -89,25 +89,6 @@ bool IsRunning(const Json::Value &entry)
     return RecordedRunning(entry) && (!entry.isMember("pid") || ProcessAlive(ProcessOf(entry)));
 }
 
-// services.json read under the lock; false (with the error state set) when it cannot be used.
-bool ReadServices(Json::Value &services)
-{
-    switch (ReadJsonFile(StatePath("services.json"), services)) {
-    case ReadStatus::kMissing:
-        services = Json::Value(Json::objectValue);
-        return true;
-    case ReadStatus::kRead:
-        if (services.isObject()) {
-            return true;
-        }
-        break;
-    case ReadStatus::kBad:
-        break;
-    }
-    EMU_SET_ERROR(kErrStateFile);
-    return false;
-}
-
 int StopLocked(Json::Value &services, const std::string &name)
 {
     const Json::Value &entry = services[name];
@@ -163,35 +144,32 @@ int ChangeService(const char *op, ServiceAction action, const char *service, std
             EMU_SET_ERROR(kErrBadArgument);
             return -1;
         }
-        StateLock lock;
-        Json::Value services;
-        if (!lock.Held()) {
-            EMU_SET_ERROR(kErrStateFile);
-            return -1;
-        }
-        if (!ReadServices(services)) {
-            return -1;
-        }
         const std::string name = service;
-        const Json::Value entry = services.get(name, Json::Value());
-        const bool running = IsRunning(entry);
         int outcome = 0;
-        bool changed = false;
-        // A record that says running with its process gone is stopped too: only the record changes.
-        if (action != ServiceAction::kStart && RecordedRunning(entry)) {
-            outcome = StopLocked(services, name);
-            changed = outcome == 0;
-        }
-        const bool starts = action == ServiceAction::kRestart || (action == ServiceAction::kStart && !running);
-        if (outcome == 0 && starts) {
-            outcome = StartLocked(services, name);
-            changed = changed || outcome == 0;
-        }
-        if (changed && !ReplaceJsonFile(StatePath("services.json"), services)) {
-            if (starts && outcome == 0) {
-                TerminateProcess(ProcessOf(services[name]));  // unrecorded, it could never be stopped
+        std::optional<LaunchedProcess> launched;
+        const bool recorded = EditStateObject("services.json", [&](Json::Value &services) {
+            const Json::Value entry = services.get(name, Json::Value());
+            const bool running = IsRunning(entry);
+            bool changed = false;
+            // A record that says running with its process gone is stopped too: only the record changes.
+            if (action != ServiceAction::kStart && RecordedRunning(entry)) {
+                outcome = StopLocked(services, name);
+                changed = outcome == 0;
             }
-            EMU_SET_ERROR(kErrStateFile);
+            const bool starts = action == ServiceAction::kRestart || (action == ServiceAction::kStart && !running);
+            if (outcome == 0 && starts) {
+                outcome = StartLocked(services, name);
+                if (outcome == 0) {
+                    launched = ProcessOf(services[name]);
+                    changed = true;
+                }
+            }
+            return changed;
+        });
+        if (!recorded) {
+            if (launched) {
+                TerminateProcess(*launched);  // unrecorded, it could never be stopped
+            }
             return -1;
         }
         return outcome;
@@ -248,28 +226,11 @@ extern "C" VEXOEMU_API int VEXOSMBSetSpotlight(int enable)
             JournalCall("VEXOSMBSetSpotlight", args, *forced, true);
             return *forced;
         }
-        const int result = [&] {
-            StateLock lock;
-            if (!lock.Held()) {
-                EMU_SET_ERROR(kErrStateFile);
-                return -1;
-            }
-            const std::string path = StatePath("smb.json");
-            Json::Value smb;
-            const ReadStatus status = ReadJsonFile(path, smb);
-            if (status == ReadStatus::kMissing) {
-                smb = Json::Value(Json::objectValue);
-            } else if (status == ReadStatus::kBad || !smb.isObject()) {
-                EMU_SET_ERROR(kErrStateFile);
-                return -1;
-            }
+        const bool set = EditStateObject("smb.json", [&](Json::Value &smb) {
             smb["spotlight"] = enable != 0;  // other members stay as they are
-            if (!ReplaceJsonFile(path, smb)) {
-                EMU_SET_ERROR(kErrStateFile);
-                return -1;
-            }
-            return 0;
-        }();
+            return true;
+        });
+        const int result = set ? 0 : -1;
         JournalCall("VEXOSMBSetSpotlight", args, result, false);
         return result;
     });

@@ -10,6 +10,8 @@
 #include "appliance_paths.h"
 #include "config/file_io.h"
 #include "config/json_io.h"
+#include "error_codes.h"
+#include "error_state_internal.h"
 
 namespace VEXO {
 namespace EMULATION {
@@ -18,32 +20,38 @@ namespace {
 // A file modified this close to the moment it was read is read again on its next use.
 constexpr time_t kRacySeconds = 2;
 
+// Exclusive hold of state.lock for the lifetime of the object.
+class StateLock {
+public:
+    StateLock() : m_fd(open(StatePath("state.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644))
+    {
+        while (m_fd >= 0 && flock(m_fd, LOCK_EX) != 0) {
+            if (errno != EINTR) {
+                close(m_fd);
+                m_fd = -1;
+            }
+        }
+    }
+    ~StateLock()
+    {
+        if (m_fd >= 0) {
+            close(m_fd);  // releases the lock
+        }
+    }
+    StateLock(const StateLock &) = delete;
+    StateLock &operator=(const StateLock &) = delete;
+
+    bool Held() const { return m_fd >= 0; }
+
+private:
+    int m_fd;
+};
+
 }  // namespace
 
 std::string StatePath(const char *fileName)
 {
     return std::string(FILEINDEX_EMULATION_STATE_DIR "/") + fileName;
-}
-
-StateLock::StateLock() : m_fd(open(StatePath("state.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644))
-{
-    if (m_fd < 0) {
-        return;
-    }
-    while (flock(m_fd, LOCK_EX) != 0) {
-        if (errno != EINTR) {
-            close(m_fd);
-            m_fd = -1;
-            return;
-        }
-    }
-}
-
-StateLock::~StateLock()
-{
-    if (m_fd >= 0) {
-        close(m_fd);  // releases the lock
-    }
 }
 
 bool ReadStateText(const std::string &path, std::string &text)
@@ -60,19 +68,33 @@ ReadStatus ParseStateText(const std::string &text, Json::Value &value)
     return FILEINDEX::fromString(value, text) ? ReadStatus::kRead : ReadStatus::kBad;
 }
 
-ReadStatus ReadJsonFile(const std::string &path, Json::Value &value)
+bool EditStateObject(const char *fileName, const std::function<bool(Json::Value &object)> &edit)
 {
-    value = Json::Value(Json::nullValue);
-    std::string text;
-    if (!ReadStateText(path, text)) {
-        return errno == ENOENT ? ReadStatus::kMissing : ReadStatus::kBad;
+    StateLock lock;
+    if (!lock.Held()) {
+        EMU_SET_ERROR(kErrStateFile);
+        return false;
     }
-    return ParseStateText(text, value);
-}
-
-bool ReplaceJsonFile(const std::string &path, const Json::Value &value)
-{
-    return FILEINDEX::ReplaceFileAtomically(path, FILEINDEX::toString(value) + "\n");
+    const std::string path = StatePath(fileName);
+    std::string text;
+    Json::Value object;
+    ReadStatus status = ReadStatus::kMissing;
+    if (ReadStateText(path, text)) {
+        status = ParseStateText(text, object);
+    } else if (errno != ENOENT) {
+        status = ReadStatus::kBad;
+    }
+    if (status == ReadStatus::kMissing) {
+        object = Json::Value(Json::objectValue);
+    } else if (status == ReadStatus::kBad || !object.isObject()) {
+        EMU_SET_ERROR(kErrStateFile);
+        return false;
+    }
+    if (edit(object) && !FILEINDEX::ReplaceFileAtomically(path, FILEINDEX::toString(object) + "\n")) {
+        EMU_SET_ERROR(kErrStateFile);
+        return false;
+    }
+    return true;
 }
 
 bool FileStamp::operator==(const FileStamp &other) const

@@ -1,12 +1,13 @@
-// The emulation's state directory: where its files are, the lock that serialises read-modify-write
-// cycles across processes, whole-file JSON reads and atomic replaces, and a parse cache that reads a
-// file again only when it changed.
+// The emulation's state directory: where its files are, the read-modify-write cycle of the files the
+// emulation changes, and a parse cache for the files tests write, which reads a file again only when
+// it changed.
 #ifndef VEXOEMU_STATE_DIR_H
 #define VEXOEMU_STATE_DIR_H
 
 #include <sys/stat.h>
 
 #include <ctime>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -19,31 +20,19 @@ namespace EMULATION {
 // "<state directory>/<fileName>".
 std::string StatePath(const char *fileName);
 
-// Exclusive hold of state.lock for the lifetime of the object. The directory must exist: the
-// emulation never creates it.
-class StateLock {
-public:
-    StateLock();
-    ~StateLock();
-    StateLock(const StateLock &) = delete;
-    StateLock &operator=(const StateLock &) = delete;
-
-    bool Held() const { return m_fd >= 0; }
-
-private:
-    int m_fd;
-};
+// Reads the state file fileName, a JSON object (a missing or empty file is {}), while holding an
+// exclusive flock on state.lock, and hands it to edit; when edit returns true, replaces the file with
+// the edited object through a temporary file and a rename, so that readers see the old or the new
+// content and nothing in between. False, with kErrStateFile in the error state, when the lock cannot
+// be taken (the emulation never creates the state directory), or the file is unreadable, not an
+// object, or cannot be replaced.
+bool EditStateObject(const char *fileName, const std::function<bool(Json::Value &object)> &edit);
 
 enum class ReadStatus { kRead, kMissing, kBad };
 
-// Reads and parses a whole file. A missing or empty file is kMissing and leaves a null value.
-ReadStatus ReadJsonFile(const std::string &path, Json::Value &value);
-// The two halves of ReadJsonFile: the raw text, and its parse (a blank text is kMissing).
+// The raw text of a state file, and its parse (a blank text is kMissing and leaves a null value).
 bool ReadStateText(const std::string &path, std::string &text);
 ReadStatus ParseStateText(const std::string &text, Json::Value &value);
-// Replaces the file with the value's compact text through a temporary file and a rename, so that
-// readers see the old or the new content and nothing in between.
-bool ReplaceJsonFile(const std::string &path, const Json::Value &value);
 
 // Identity of a file's content as far as stat tells it.
 struct FileStamp {
