@@ -63,50 +63,48 @@ private:
 
     bool Object(int depth)
     {
-        if (depth > kMaxJsonDepth) {
-            return false;
-        }
-        ++m_pos;
-        SkipWhiteSpace();
-        if (Take('}')) {
-            return true;
-        }
-        do {
-            SkipWhiteSpace();
-            if (AtEnd() || Peek() != '"' || !String()) {
-                return false;
-            }
-            SkipWhiteSpace();
-            if (!Take(':')) {
-                return false;
-            }
-            SkipWhiteSpace();
-            if (!Value(depth)) {
-                return false;
-            }
-            SkipWhiteSpace();
-        } while (Take(','));
-        return Take('}');
+        return Elements(depth, '}', [this, depth] { return Member(depth); });
     }
 
     bool Array(int depth)
+    {
+        return Elements(depth, ']', [this, depth] { return Value(depth); });
+    }
+
+    // The opening bracket, then elements separated by commas (none at all is allowed), then close.
+    template <typename Element>
+    bool Elements(int depth, char close, const Element &element)
     {
         if (depth > kMaxJsonDepth) {
             return false;
         }
         ++m_pos;
         SkipWhiteSpace();
-        if (Take(']')) {
+        if (Take(close)) {
             return true;
         }
         do {
             SkipWhiteSpace();
-            if (!Value(depth)) {
+            if (!element()) {
                 return false;
             }
             SkipWhiteSpace();
         } while (Take(','));
-        return Take(']');
+        return Take(close);
+    }
+
+    // "name" : value
+    bool Member(int depth)
+    {
+        if (AtEnd() || Peek() != '"' || !String()) {
+            return false;
+        }
+        SkipWhiteSpace();
+        if (!Take(':')) {
+            return false;
+        }
+        SkipWhiteSpace();
+        return Value(depth);
     }
 
     static bool IsHexDigit(char c)

@@ -20,10 +20,12 @@ namespace FILEINDEX {
 // that is not an object), except GetPauseInfo, which catches it.
 class FILEINDEX_EXPORT Status : public Config {
 public:
+    // "/usr/vexo/etc/fileindex/status.conf" and "/tmp/fileidx_cfg_status.lock".
+    std::string GetPath() const override;
+    std::string GetLockPath() const override;
+    // Config::LoadJson and Config::SaveJson: the document as the file holds it, its shape unchecked.
     bool Load() override;
     bool Save() override;
-    std::string GetLockPath() const override;
-    std::string GetPath() const override;
 
     // Sets the top-level member name to true. There is no way to clear it.
     bool SetUpdated(const std::string &name);

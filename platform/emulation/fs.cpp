@@ -22,23 +22,16 @@ namespace VEXO {
 namespace EMULATION {
 namespace {
 
-// The platform's file-system type codes, as docs/emulation.md lists them.
+// The platform's file-system type codes, numbered from 0 as docs/emulation.md lists them.
 enum FsTypeCode {
-    kFsOther = 0,  // a file system this table does not know
-    kFsExt = 1,
-    kFsBtrfs = 2,
-    kFsXfs = 3,
-    kFsTmpfs = 4,
-    kFsOverlay = 5,
-    kFsFat = 6,
-    kFsEcryptfs = 7,
-    kFsNfs = 8,
-    kFsCifs = 9,
-    kFsIso9660 = 10,
-    kFsUdf = 11,
-    kFsFuse = 12,
-    kFsSquashfs = 13,
+    kFsOther,                                                               // a file system not known here
+    kFsExt, kFsBtrfs, kFsXfs, kFsTmpfs, kFsOverlay, kFsFat, kFsEcryptfs,   // 1-7: local
+    kFsNfs, kFsCifs,                                                        // 8-9: remote
+    kFsIso9660, kFsUdf,                                                     // 10-11: images
+    kFsFuse,                                                                // 12: local
+    kFsSquashfs,                                                            // 13: image
 };
+static_assert(kFsSquashfs == 13, "the codes are the platform's");
 
 struct MagicCode {
     unsigned long magic;  // statfs f_type

@@ -39,6 +39,24 @@ void CopyTruncated(char *buffer, int size, const std::string &text)
     buffer[length] = '\0';
 }
 
+// The share find picks for key from the current database; shares keeps the answer alive. Null, with
+// the error state set, when key is null or the outputs are not usable (kErrBadArgument), the
+// database fails (kErrStateFile) or holds no such share (kErrNoSuchShare).
+const ShareInfo *LookUp(std::shared_ptr<const ShareList> &shares,
+                        const ShareInfo *(*find)(const ShareList &, const char *), const char *key, bool outputsUsable)
+{
+    if (key == nullptr || !outputsUsable) {
+        EMU_SET_ERROR(kErrBadArgument);
+        return nullptr;
+    }
+    shares = LoadShares();
+    const ShareInfo *share = shares != nullptr ? find(*shares, key) : nullptr;
+    if (shares != nullptr && share == nullptr) {
+        EMU_SET_ERROR(kErrNoSuchShare);
+    }
+    return share;
+}
+
 // The common shape of the three flag getters.
 int GetFlag(const char *op, const VEXOSHARE *share, int *flag, bool ShareRecord::*member)
 {
@@ -74,17 +92,9 @@ extern "C" VEXOEMU_API int VEXOShareGet(const char *szName, PVEXOSHARE *ppShare)
         if (const std::optional<int> forced = ForcedResult("VEXOShareGet", szName)) {
             return *forced < 0 ? *forced : -1;  // a forced look-up never yields a record
         }
-        if (szName == nullptr || ppShare == nullptr) {
-            EMU_SET_ERROR(kErrBadArgument);
-            return -1;
-        }
-        const std::shared_ptr<const ShareList> shares = LoadShares();
-        if (shares == nullptr) {
-            return -1;
-        }
-        const ShareInfo *share = FindShareByName(*shares, szName);
+        std::shared_ptr<const ShareList> shares;
+        const ShareInfo *share = LookUp(shares, FindShareByName, szName, ppShare != nullptr);
         if (share == nullptr) {
-            EMU_SET_ERROR(kErrNoSuchShare);
             return -1;
         }
         ShareRecord *record = static_cast<ShareRecord *>(std::calloc(1, sizeof(ShareRecord)));
@@ -124,17 +134,9 @@ extern "C" VEXOEMU_API int VEXOShareNamePathGet(const char *szFullPath, char *sz
             }
             return *forced;
         }
-        if (szFullPath == nullptr || !buffersUsable) {
-            EMU_SET_ERROR(kErrBadArgument);
-            return -1;
-        }
-        const std::shared_ptr<const ShareList> shares = LoadShares();
-        if (shares == nullptr) {
-            return -1;
-        }
-        const ShareInfo *share = FindShareHolding(*shares, szFullPath);
+        std::shared_ptr<const ShareList> shares;
+        const ShareInfo *share = LookUp(shares, FindShareHolding, szFullPath, buffersUsable);
         if (share == nullptr) {
-            EMU_SET_ERROR(kErrNoSuchShare);
             return -1;
         }
         CopyTruncated(szName, cbName, share->name);
