@@ -46,11 +46,12 @@ TEST_F(DaemonChannelTest, LongCommandIsWrittenInPiecesOfAtMost1024Bytes)
 {
     FrameListener daemon;
     Json::Value data;
-    data["folder_path"] = "/photo/" + std::string(5000, 'x');
+    const std::string path = "/photo/" + std::string(5000, 'x');
+    data["folder_path"] = path;
     SocketWriteRecorder writes;
     ASSERT_TRUE(SendCammandToDaemon("upsert_folder_setting", data));
     const std::string text = FrameListener::TextOfFrame(daemon.Connections(1).at(0));
-    EXPECT_EQ(text, "{\"data\":{\"folder_path\":\"/photo/" + std::string(5000, 'x') + "\"},\"type\":\"upsert_folder_setting\"}");
+    EXPECT_EQ(text, "{\"data\":{\"folder_path\":\"" + path + "\"},\"type\":\"upsert_folder_setting\"}");
 
     const std::vector<size_t> sizes = writes.Sizes();
     ASSERT_GE(sizes.size(), 6u);

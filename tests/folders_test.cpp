@@ -1,6 +1,9 @@
 // The folder list: loading, merging settings with their change reports, removing, listing, and the
 // locked lookup of IndexMgr.
+#include <memory>
+
 #include "fileindex/error.h"
+#include "fileindex/fileidx.h"
 #include "fileindex/folder.h"
 #include "fileindex/index_mgr.h"
 #include "folder/change_report.h"
@@ -14,11 +17,6 @@ namespace fileindex_test {
 namespace {
 
 const std::string kFolderConf = FILEINDEX_FOLDER_CONF_PATH;
-
-Json::Value Request(const std::string &text)
-{
-    return ParseJson(text);
-}
 
 Json::Value Report(bool document, bool audio, bool video, bool photo)
 {
@@ -52,7 +50,7 @@ protected:
         Folders folders;
         ASSERT_TRUE(folders.Load());
         Json::Value report;
-        ASSERT_TRUE(folders.Upsert(report, Request(request)));
+        ASSERT_TRUE(folders.Upsert(report, ParseJson(request)));
         ASSERT_TRUE(folders.Save());
     }
 
@@ -62,7 +60,7 @@ protected:
 TEST_F(FoldersTest, LoadMergesOnlyWellTypedKeysAndReloadStartsFromDefaults)
 {
     Folder folder = MakeFolder("/photo/a", R"({"name":"a","video":true})");
-    EXPECT_TRUE(folder.Load("/photo/a", Request(R"({"path":"/ignored","name":5,"audio":true,"photo":1})")));
+    EXPECT_TRUE(folder.Load("/photo/a", ParseJson(R"({"path":"/ignored","name":5,"audio":true,"photo":1})")));
     EXPECT_EQ(folder.m_path, "/photo/a");
     EXPECT_EQ(folder.m_name, "a");
     EXPECT_TRUE(folder.m_bAudio);
@@ -71,14 +69,15 @@ TEST_F(FoldersTest, LoadMergesOnlyWellTypedKeysAndReloadStartsFromDefaults)
     EXPECT_EQ(folder.m_fullPath, HostPath("/volume1/photo/a"));
 
     EXPECT_TRUE(folder.Reload("/photo/a", Json::Value(Json::objectValue)));
-    EXPECT_EQ(folder.asJson(), Request(R"({"path":"/photo/a","name":"","document":false,"audio":false,"video":false,"photo":false})"));
+    EXPECT_EQ(folder.asJson(),
+              ParseJson(R"({"path":"/photo/a","name":"","document":false,"audio":false,"video":false,"photo":false})"));
     EXPECT_FALSE(folder.Reload("/gone/a", Json::Value(Json::objectValue)));
 }
 
 TEST_F(FoldersTest, FullPathOfALoadedFolderIsCachedAndAFailedOneIsLogged)
 {
     const Folder loaded = MakeFolder("/photo/a");
-    SetFaults(Request(R"({"VEXOShareGet": {"result": -1}})"));
+    SetFaults(ParseJson(R"({"VEXOShareGet": {"result": -1}})"));
     EXPECT_EQ(loaded.GetFullPath(), HostPath("/volume1/photo/a"));
     EXPECT_TRUE(LogCapture::Lines().empty());
 
@@ -87,6 +86,8 @@ TEST_F(FoldersTest, FullPathOfALoadedFolderIsCachedAndAFailedOneIsLogged)
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to get full path from /photo/b"});
 }
 
+// A folder list that cannot be used fails the list with its code, and the queries answer no (0 from
+// the flat functions, never a negative number).
 TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
 {
     const struct {
@@ -94,9 +95,9 @@ TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
         _tag_fileindex_err_ code;
         std::string message;
     } cases[] = {
-        {"[1,2]", FILEIDX_ERR_MALFORMED_CONFIG, "Malformed folders: [1,2]"},
+        {"[\"/photo\"]", FILEIDX_ERR_MALFORMED_CONFIG, "Malformed folders: [\"/photo\"]"},
         {"\"text\"", FILEIDX_ERR_MALFORMED_CONFIG, "Malformed folders: \"text\""},
-        {"{\"/photo/a\":{\"name\":", FILEIDX_ERR_LOAD_CONFIG, "Failed to load json from " + kFolderConf},
+        {"{\"/photo\":{\"name\":", FILEIDX_ERR_LOAD_CONFIG, "Failed to load json from " + kFolderConf},
         {"", FILEIDX_ERR_LOAD_CONFIG, "Failed to load json from " + kFolderConf},
     };
     for (const auto &c : cases) {
@@ -109,21 +110,17 @@ TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
         EXPECT_EQ(listed.size(), 1u) << "out is untouched on failure";
         EXPECT_EQ(ErrorHandler::GetError(), c.code);
         EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{c.message});
+        EXPECT_EQ(FILEIDXIsPathIndexed("/photo"), 0);
+        EXPECT_EQ(FILEIDXIsFullPathIndexed(HostPath("/volume1/photo").c_str()), 0);
+        EXPECT_EQ(FILEIDXIsShareIndexed("photo"), 0);
+        EXPECT_FALSE(IndexMgr::IsPathContainIndexed("/"));
     }
-}
-
-TEST_F(FoldersTest, MissingFileIsAnEmptyListAndTheFirstSaveCreatesIt)
-{
-    std::vector<Folder> listed(3);
-    ASSERT_TRUE(IndexMgr::List(listed));
-    EXPECT_TRUE(listed.empty());
-    UpsertAndSave(R"({"path":"/photo/a","name":"A","photo":true})");
-    EXPECT_EQ(StoredDocument(), Request(R"({"/photo/a":{"path":"/photo/a","name":"A","document":false,"audio":false,"video":false,"photo":true}})"));
 }
 
 TEST_F(FoldersTest, OddRecordsLoadAndAreWrittenBackAsFullRecords)
 {
-    WriteFile(kFolderConf, R"({"/photo/str":"text","/gone/x":{"path":"/elsewhere","name":"x","audio":true,"extra":1}})");
+    WriteFile(kFolderConf,
+              R"({"/photo/str":"text","/gone/x":{"path":"/elsewhere","name":"x","audio":true,"extra":1}})");
     Folders folders;
     ASSERT_TRUE(folders.Load());
     std::vector<Folder> listed;
@@ -133,7 +130,7 @@ TEST_F(FoldersTest, OddRecordsLoadAndAreWrittenBackAsFullRecords)
     EXPECT_EQ(listed[0].m_fullPath, "") << "a folder whose share is gone still loads";
     EXPECT_TRUE(listed[0].m_bAudio);
     ASSERT_TRUE(folders.Save());
-    EXPECT_EQ(StoredDocument(), Request(R"({
+    EXPECT_EQ(StoredDocument(), ParseJson(R"({
         "/gone/x":{"path":"/gone/x","name":"x","document":false,"audio":true,"video":false,"photo":false},
         "/photo/str":{"path":"/photo/str","name":"","document":false,"audio":false,"video":false,"photo":false}})"));
 }
@@ -151,39 +148,34 @@ TEST_F(FoldersTest, SecondLoadKeepsTheFirstValues)
     EXPECT_TRUE(folders.Get(record, "/photo/b"));
 }
 
-TEST_F(FoldersTest, UpsertOfANewPathStartsFromDefaultsAndReportsAgainstTheGoverningSetting)
+// Steps into one list: a new path starts from defaults, a stored one keeps what the request leaves
+// out or gives with the wrong type, and each report is taken against the setting that governed the
+// path before.
+TEST_F(FoldersTest, UpsertMergesIntoDefaultsOrTheStoredSettingAndReportsWhatChanged)
 {
+    const struct {
+        const char *request;
+        bool document, audio, video, photo;
+    } steps[] = {
+        {R"({"path":"/photo"})", true, true, true, true},  // nothing governed it
+        {R"({"path":"/photo","photo":true,"video":true})", false, false, true, true},
+        {R"({"path":"/photo/inner","photo":true,"audio":true})", false, true, true, false},  // against /photo
+        {R"({"path":"/photo/a","name":"A","document":true,"audio":false})", true, false, true, true},
+        {R"({"path":"/photo/a","audio":true,"video":"yes"})", false, true, false, false},
+        {R"({"path":"/photo/a","audio":true})", false, false, false, false},
+    };
     Folders folders;
     ASSERT_TRUE(folders.Load());
-    Json::Value report;
-    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo"})")));
-    EXPECT_EQ(report, Report(true, true, true, true)) << "nothing governed the path before";
-
-    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo","photo":true,"video":true})")));
-    EXPECT_EQ(report, Report(false, false, true, true));
-
-    // An inner folder with its own settings, reported against the outer folder that governed it.
-    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/inner","photo":true,"audio":true})")));
-    EXPECT_EQ(report, Report(false, true, true, false));
-
-    Json::Value record;
-    ASSERT_TRUE(folders.Get(record, "/photo/inner"));
-    EXPECT_EQ(record, Request(R"({"path":"/photo/inner","name":"","document":false,"audio":true,"video":false,"photo":true})"));
-}
-
-TEST_F(FoldersTest, UpsertOfAStoredPathMergesAndReportsOnlyWhatChanged)
-{
-    UpsertAndSave(R"({"path":"/photo/a","name":"A","document":true,"audio":false})");
-    Folders folders;
-    ASSERT_TRUE(folders.Load());
-    Json::Value report;
-    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/a","audio":true,"video":"yes"})")));
-    EXPECT_EQ(report, Report(false, true, false, false));
-    ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/a","audio":true})")));
-    EXPECT_EQ(report, Report(false, false, false, false));
-    Json::Value record;
-    ASSERT_TRUE(folders.Get(record, "/photo/a"));
-    EXPECT_EQ(record, Request(R"({"path":"/photo/a","name":"A","document":true,"audio":true,"video":false,"photo":false})"));
+    for (const auto &step : steps) {
+        Json::Value report;
+        ASSERT_TRUE(folders.Upsert(report, ParseJson(step.request)));
+        EXPECT_EQ(report, Report(step.document, step.audio, step.video, step.photo)) << step.request;
+    }
+    ASSERT_TRUE(folders.Save());
+    EXPECT_EQ(StoredDocument(), ParseJson(R"({
+        "/photo":{"path":"/photo","name":"","document":false,"audio":false,"video":true,"photo":true},
+        "/photo/inner":{"path":"/photo/inner","name":"","document":false,"audio":true,"video":false,"photo":true},
+        "/photo/a":{"path":"/photo/a","name":"A","document":true,"audio":true,"video":false,"photo":false}})"));
 }
 
 TEST_F(FoldersTest, UpsertRefusesARequestWithoutAResolvablePath)
@@ -207,7 +199,7 @@ TEST_F(FoldersTest, UpsertRefusesARequestWithoutAResolvablePath)
         Folders folders;
         ASSERT_TRUE(folders.Load());
         Json::Value report = "untouched";
-        EXPECT_FALSE(folders.Upsert(report, Request(c.request)));
+        EXPECT_FALSE(folders.Upsert(report, ParseJson(c.request)));
         EXPECT_EQ(report, "untouched");
         EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_BAD_PARAM);
         EXPECT_EQ(LogCapture::Messages(), c.messages);
@@ -222,13 +214,13 @@ TEST_F(FoldersTest, TheThousandthFolderFitsAndTheNextOneDoesNot)
     ASSERT_TRUE(folders.Load());
     Json::Value report;
     for (int i = 0; i < 1000; ++i) {
-        ASSERT_TRUE(folders.Upsert(report, Request(R"({"path":"/photo/)" + std::to_string(i) + R"("})"))) << i;
+        ASSERT_TRUE(folders.Upsert(report, ParseJson(R"({"path":"/photo/)" + std::to_string(i) + R"("})"))) << i;
     }
     ASSERT_TRUE(folders.Save());
     EXPECT_EQ(StoredDocument().size(), 1000u);
 
     LogCapture::Clear();
-    EXPECT_FALSE(folders.Upsert(report, Request(R"({"path":"/photo/new"})")));
+    EXPECT_FALSE(folders.Upsert(report, ParseJson(R"({"path":"/photo/new"})")));
     EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_EXCEED_MAX_FOLDER);
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Exceed max folder size"});
     std::vector<Folder> listed;
@@ -237,7 +229,7 @@ TEST_F(FoldersTest, TheThousandthFolderFitsAndTheNextOneDoesNot)
 
     Folders reloaded;
     ASSERT_TRUE(reloaded.Load());
-    EXPECT_TRUE(reloaded.Upsert(report, Request(R"({"path":"/photo/999","audio":true})")))
+    EXPECT_TRUE(reloaded.Upsert(report, ParseJson(R"({"path":"/photo/999","audio":true})")))
         << "changing a stored folder of a full list is still allowed";
 }
 
@@ -266,37 +258,36 @@ TEST_F(FoldersTest, DeleteReportsKeyedByPathAndErasesEvenWhenThePathNoLongerReso
     EXPECT_EQ(StoredDocument().getMemberNames(), std::vector<std::string>{"/photo"});
 }
 
-TEST_F(FoldersTest, GetMatchesThePathExactly)
+// Get reads under the folder lock and releases it on every path; List reads without it.
+TEST_F(FoldersTest, GetFindsTheExactPathUnderTheFolderLock)
 {
     UpsertAndSave(R"({"path":"/photo/a","name":"A"})");
-    Json::Value record = "untouched";
-    EXPECT_FALSE(IndexMgr::Get(record, "/photo/a/"));
-    EXPECT_EQ(record, "untouched");
-    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NO_SUCH_FOLDER);
-    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"No such folder: /photo/a/"});
-    ASSERT_TRUE(IndexMgr::Get(record, "/photo/a"));
-    EXPECT_EQ(record["name"], "A");
-}
-
-TEST_F(FoldersTest, GetTakesTheFolderLockWhileListReadsWithoutIt)
-{
-    UpsertAndSave(R"({"path":"/photo/a"})");
-    LogCapture::Clear();
-    {
-        LockHolder writer(FILEINDEX_FOLDER_LOCK_PATH, true);
+    const struct {
+        const char *path;
+        bool locked;  // another process holds the folder lock
+        _tag_fileindex_err_ code;
+        const char *message;  // nullptr: found
+    } cases[] = {
+        {"/photo/a/", false, FILEIDX_ERR_NO_SUCH_FOLDER, "No such folder: /photo/a/"},
+        {"/photo/a", true, FILEIDX_ERR_LOCK, "Failed to lock folder"},
+        {"/photo/a", false, FILEIDX_ERR_NONE, nullptr},
+        {"/photo/a", false, FILEIDX_ERR_NONE, nullptr},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(std::string(c.path) + (c.locked ? " while locked" : ""));
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        const auto writer = c.locked ? std::make_unique<LockHolder>(FILEINDEX_FOLDER_LOCK_PATH, true) : nullptr;
         Json::Value record = "untouched";
-        EXPECT_FALSE(IndexMgr::Get(record, "/photo/a"));
-        EXPECT_EQ(record, "untouched");
-        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_LOCK);
-        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to lock folder"});
-
+        EXPECT_EQ(IndexMgr::Get(record, c.path), c.message == nullptr);
+        EXPECT_EQ(record, c.message == nullptr ? ParseJson(ReadFile(kFolderConf))["/photo/a"] : "untouched");
+        EXPECT_EQ(ErrorHandler::GetError(), c.code);
+        EXPECT_EQ(LogCapture::Messages(), c.message == nullptr ? std::vector<std::string>{}
+                                                               : std::vector<std::string>{c.message});
         std::vector<Folder> listed;
         EXPECT_TRUE(IndexMgr::List(listed));
         EXPECT_EQ(listed.size(), 1u);
     }
-    Json::Value record;
-    EXPECT_TRUE(IndexMgr::Get(record, "/photo/a")) << "Get released its lock after the failure";
-    EXPECT_TRUE(IndexMgr::Get(record, "/photo/a")) << "Get released its lock after success";
 }
 
 TEST_F(FoldersTest, ListOfOneShareComparesWholeNamesExactly)
@@ -304,20 +295,17 @@ TEST_F(FoldersTest, ListOfOneShareComparesWholeNamesExactly)
     WriteFile(kFolderConf, R"({"/video/a":{},"/video2/b":{},"/Video/c":{},"":{},"/video":{}})");
     Folders folders;
     ASSERT_TRUE(folders.Load());
-    std::vector<Folder> listed;
-    ASSERT_TRUE(folders.List(listed, "video"));
-    std::vector<std::string> paths;
-    for (const Folder &folder : listed) {
-        paths.push_back(folder.m_path);
-    }
-    EXPECT_EQ(paths, (std::vector<std::string>{"/video", "/video/a"}));
-
-    ASSERT_TRUE(folders.List(listed));
-    paths.clear();
-    for (const Folder &folder : listed) {
-        paths.push_back(folder.m_path);
-    }
-    EXPECT_EQ(paths, (std::vector<std::string>{"", "/Video/c", "/video", "/video/a", "/video2/b"}));
+    const auto listedPaths = [&folders](const std::string &share) {
+        std::vector<Folder> listed(3);
+        EXPECT_TRUE(folders.List(listed, share));
+        std::vector<std::string> paths;
+        for (const Folder &folder : listed) {
+            paths.push_back(folder.m_path);
+        }
+        return paths;
+    };
+    EXPECT_EQ(listedPaths("video"), (std::vector<std::string>{"/video", "/video/a"}));
+    EXPECT_EQ(listedPaths(""), (std::vector<std::string>{"", "/Video/c", "/video", "/video/a", "/video2/b"}));
 }
 
 TEST_F(FoldersTest, GoverningSettingIsTheLastMatchInListOrderNotTheInnermost)
@@ -353,7 +341,7 @@ TEST_F(FoldersTest, GoverningSettingIsTheLastMatchInListOrderNotTheInnermost)
 
 TEST_F(FoldersTest, BytesThatAreNotUtf8SurviveUpsertSaveLoadAndGet)
 {
-    const std::string path = "/photo/caf\xe9/\xff\"q\\";
+    const std::string path = "/photo/caf\xe9/\xff\"q\\\x1f";
     const std::string name = "n\xfe\x80";
     Json::Value request;
     request["path"] = path;

@@ -52,16 +52,6 @@ TEST(SharePaths, ReplaceShareNameRewritesOnlyTheFirstComponent)
     }
 }
 
-TEST(SharePaths, StringStartWithIsAPlainBytePrefixTest)
-{
-    EXPECT_TRUE(StringStartWith("/photo2", "/photo"));
-    EXPECT_TRUE(StringStartWith("/photo", "/photo"));
-    EXPECT_TRUE(StringStartWith("anything", ""));
-    EXPECT_FALSE(StringStartWith("/ph", "/photo"));
-    EXPECT_FALSE(StringStartWith("/Photo", "/photo"));
-    EXPECT_FALSE(StringStartWith(std::string("/a\0b", 4), std::string("/a\0c", 4)));
-}
-
 class ShareResolutionTest : public SandboxTest {
 protected:
     void SetUp() override
@@ -76,40 +66,32 @@ TEST_F(ShareResolutionTest, FullPathIsTheShareVolumeFollowedByThePathAsGiven)
 {
     const struct {
         const char *path;
-        std::string full;
+        std::string full;  // "": the path does not resolve
+        _tag_fileindex_err_ code;
+        std::vector<std::string> messages;
     } cases[] = {
-        {"/photo", HostPath("/volume1/photo")},
-        {"/photo/holiday/trip", HostPath("/volume1/photo/holiday/trip")},
-        {"/music//a/", HostPath("/volume2/music//a/")},
-        {"/Photo/x", HostPath("/volume1/Photo/x")},  // the database ignores case; the caller's case is kept
+        {"/photo", HostPath("/volume1/photo"), FILEIDX_ERR_NONE, {}},
+        {"/photo/holiday/trip", HostPath("/volume1/photo/holiday/trip"), FILEIDX_ERR_NONE, {}},
+        {"/music//a/", HostPath("/volume2/music//a/"), FILEIDX_ERR_NONE, {}},
+        {"/Photo/x", HostPath("/volume1/Photo/x"), FILEIDX_ERR_NONE, {}},  // the caller's case is kept
+        {"/nosuch/a", "", FILEIDX_ERR_PATH, {}},
+        {"", "", FILEIDX_ERR_NONE, {"GetShareNameByPath failed, path="}},
     };
     for (const auto &c : cases) {
-        std::string full;
-        EXPECT_TRUE(GetFullPath(full, c.path)) << c.path;
-        EXPECT_EQ(full, c.full);
+        SCOPED_TRACE(c.path);
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        std::string full = "untouched";
+        EXPECT_EQ(GetFullPath(full, c.path), !c.full.empty());
+        EXPECT_EQ(full, c.full.empty() ? "untouched" : c.full);
+        EXPECT_EQ(ErrorHandler::GetError(), c.code);
+        EXPECT_EQ(LogCapture::Messages(), c.messages);
     }
-    EXPECT_TRUE(LogCapture::Lines().empty());
-    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
-}
-
-TEST_F(ShareResolutionTest, UnknownShareSetsCode2WithoutALogLine)
-{
-    std::string full = "untouched";
-    EXPECT_FALSE(GetFullPath(full, "/nosuch/a"));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_PATH);
-    EXPECT_TRUE(LogCapture::Lines().empty());
-}
-
-TEST_F(ShareResolutionTest, EmptyPathLogsOneErrorLineAndSetsNoCode)
-{
-    std::string full;
-    EXPECT_FALSE(GetFullPath(full, ""));
-    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
+    // Log lines go out at error priority, source file and line first.
     const std::vector<LogLine> lines = LogCapture::Lines();
     ASSERT_EQ(lines.size(), 1u);
     EXPECT_EQ(lines[0].priority, LOG_ERR);
-    EXPECT_EQ(lines[0].text.rfind("utils.cpp:", 0), 0u) << "source file and line come first";
-    EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"GetShareNameByPath failed, path="});
+    EXPECT_EQ(lines[0].text.rfind("utils.cpp:", 0), 0u);
 }
 
 TEST_F(ShareResolutionTest, ShareOfAFullPathFollowsWholeComponents)
@@ -117,13 +99,11 @@ TEST_F(ShareResolutionTest, ShareOfAFullPathFollowsWholeComponents)
     std::string share;
     std::string sharePath;
     ASSERT_TRUE(GetShareNamePathByFullPath(share, sharePath, HostPath("/volume1/photo/a/b")));
-    EXPECT_EQ(share, "photo");
-    EXPECT_EQ(sharePath, SharePath("photo"));
+    EXPECT_EQ(share + " " + sharePath, "photo " + SharePath("photo"));
 
-    share = "untouched";
     const std::string sibling = HostPath("/volume1/photo2/a");
     EXPECT_FALSE(GetShareNamePathByFullPath(share, sharePath, sibling));
-    EXPECT_EQ(share, "untouched");
+    EXPECT_EQ(share + " " + sharePath, "photo " + SharePath("photo")) << "untouched";
     EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_PATH);
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"VEXOShareNamePathGet failed, path=" + sibling});
 }

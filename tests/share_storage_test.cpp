@@ -1,7 +1,5 @@
 // Where each share keeps its event queue and index database, and the registration of its indexed
 // folders with the file-change notification daemon.
-#include <sys/stat.h>
-
 #include <cstring>
 
 #include "fileindex/error.h"
@@ -46,48 +44,55 @@ TEST_F(ShareStorageTest, InvalidArgumentsNameTheFirstFailedCheck)
     };
     for (const auto &c : cases) {
         LogCapture::Clear();
-        const int result = c.queue ? FILEIDXQueuePathGet(c.name, c.out, c.size) : FILEIDXDBPathGet(c.name, c.out, c.size);
+        const int result =
+            c.queue ? FILEIDXQueuePathGet(c.name, c.out, c.size) : FILEIDXDBPathGet(c.name, c.out, c.size);
         EXPECT_EQ(result, -1) << c.check;
-        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{std::string("Invaild Argument (") + c.check + ")=[0]\n"});
-        const Json::Value recorded = JournalOf("VLIBCErrSetEx").back()["args"];
+        EXPECT_EQ(LogCapture::Messages(),
+                  std::vector<std::string>{std::string("Invaild Argument (") + c.check + ")=[0]\n"});
+        const Json::Value recorded = Journal("VLIBCErrSetEx").back()["args"];
         EXPECT_EQ(recorded[0].asInt(), 0x0D00);
         EXPECT_EQ(recorded[1].asString(), "utils.cpp");
     }
-    EXPECT_EQ(JournalOf("VLIBCErrSetEx").size(), 5u);
-    EXPECT_TRUE(JournalOf("VEXOEAMKDir").empty()) << "nothing is made for a refused call";
+    EXPECT_EQ(Journal("VLIBCErrSetEx").size(), 5u);
+    EXPECT_TRUE(Journal("VEXOEAMKDir").empty()) << "nothing is made for a refused call";
     EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE) << "the library's own code is untouched";
 }
 
-TEST_F(ShareStorageTest, QueuePathMakesTheMetadataDirectoryButNotTheQueue)
+TEST_F(ShareStorageTest, PathsLieInTheSharesMetadataDirectoryWhichIsMade)
 {
-    char buffer[4096];
-    const int length = FILEIDXQueuePathGet("PHOTO", buffer, sizeof(buffer));
-    EXPECT_EQ(buffer, Queue("photo"));
-    EXPECT_EQ(length, static_cast<int>(strlen(buffer)));
-    EXPECT_TRUE(stdfs::exists(MetadataDirPath(SharePath("photo"))));
-    EXPECT_FALSE(stdfs::exists(buffer));
-    EXPECT_TRUE(LogCapture::Lines().empty());
-}
+    // The names the daemon and the notification daemon look for, spelt out once.
+    EXPECT_EQ(StoragePath("/v/s", kQueueFileName), "/v/s/@eaDir/VEXO@file_index_queue");
+    EXPECT_EQ(StoragePath("/v/s", kDatabaseDirName), "/v/s/@eaDir/VEXO@.fileindexdb");
+    EXPECT_EQ(QueueCompanionPath("/v/s/q"), "/v/s/q.tmp");
 
-TEST_F(ShareStorageTest, DatabasePathMakesTheDirectoryOnceAndQuietlyAfterwards)
-{
-    char buffer[4096];
+    const std::string queue = Queue("photo");
     const std::string database = StoragePath(SharePath("photo"), kDatabaseDirName);
-    EXPECT_EQ(FILEIDXDBPathGet("photo", buffer, sizeof(buffer)), static_cast<int>(database.size()));
-    EXPECT_EQ(buffer, database);
-    struct stat st;
-    ASSERT_EQ(stat(database.c_str(), &st), 0);
-    EXPECT_TRUE(S_ISDIR(st.st_mode));
-    EXPECT_EQ(FILEIDXDBPathGet("photo", buffer, sizeof(buffer)), static_cast<int>(database.size()));
+    const struct {
+        bool isQueue;
+        const char *share;
+        int size;
+        std::string path;
+        bool madeDir;  // the final path is a directory afterwards
+    } cases[] = {
+        {true, "PHOTO", 4096, queue, false},  // the share's stored path, whatever the case asked for
+        {true, "photo", 12, queue, false},    // cut to the buffer, terminated
+        {false, "photo", 4096, database, true},
+        {false, "photo", 4096, database, true},  // made already: quietly again
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.path + " in " + std::to_string(c.size));
+        char buffer[4096];
+        memset(buffer, 'z', sizeof(buffer));
+        const int length = c.isQueue ? FILEIDXQueuePathGet(c.share, buffer, c.size)
+                                     : FILEIDXDBPathGet(c.share, buffer, c.size);
+        const std::string expected = c.path.substr(0, static_cast<size_t>(c.size) - 1);
+        EXPECT_EQ(std::string(buffer, strnlen(buffer, sizeof(buffer))), expected);
+        EXPECT_EQ(length, static_cast<int>(expected.size()));
+        EXPECT_TRUE(stdfs::is_directory(MetadataDirPath(SharePath("photo"))));
+        EXPECT_EQ(stdfs::is_directory(c.path), c.madeDir);
+        EXPECT_FALSE(stdfs::exists(queue)) << "the queue file is made by its first writer";
+    }
     EXPECT_TRUE(LogCapture::Lines().empty());
-}
-
-TEST_F(ShareStorageTest, ShortBufferGetsATruncatedTerminatedPath)
-{
-    char buffer[12];
-    memset(buffer, 'z', sizeof(buffer));
-    EXPECT_EQ(FILEIDXQueuePathGet("photo", buffer, sizeof(buffer)), 11);
-    EXPECT_EQ(std::string(buffer), Queue("photo").substr(0, 11));
 }
 
 TEST_F(ShareStorageTest, FailuresOnTheWayAreLoggedAndUnknownSharesRefused)
@@ -111,27 +116,27 @@ TEST_F(ShareStorageTest, FailuresOnTheWayAreLoggedAndUnknownSharesRefused)
 
 class MonitorRegistrationTest : public ShareStorageTest {};
 
-TEST_F(MonitorRegistrationTest, ShareIsRegisteredWithOneEntryPerIndexedFolder)
+TEST_F(MonitorRegistrationTest, ShareIsRegisteredWithOneEntryPerIndexedFolderInPathOrder)
 {
-    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/b":{},"/photo/a":{},"/photo":{},"/video/x":{}})");
-    ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg("photo"));
-    const std::vector<Json::Value> calls = JournalOf("MonitorQueue::Upsert");
-    ASSERT_EQ(calls.size(), 1u);
-    Json::Value expected = ParseJson(R"([{"queue": "", "config": [
-        {"path": "", "mask": 65486, "ignore": ["@eaDir"]},
-        {"path": "", "mask": 65486, "ignore": ["@eaDir"]},
-        {"path": "", "mask": 65486, "ignore": ["@eaDir"]}]}, "fileindex", 1])");
-    expected[0]["queue"] = Queue("photo");
-    expected[0]["config"][0]["path"] = SharePath("photo");
-    expected[0]["config"][1]["path"] = SharePath("photo") + "/a";
-    expected[0]["config"][2]["path"] = SharePath("photo") + "/b";
-    EXPECT_EQ(calls[0]["args"], expected);
-}
-
-TEST_F(MonitorRegistrationTest, ShareWithoutFoldersIsRegisteredEmpty)
-{
-    ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg("video"));
-    EXPECT_EQ(JournalOf("MonitorQueue::Upsert").at(0)["args"][0]["config"], Json::Value(Json::arrayValue));
+    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/b":{},"/photo/a":{},"/photo":{},"/photos/x":{}})");
+    const struct {
+        const char *share;
+        std::vector<std::string> folders;  // inside the share
+    } cases[] = {{"photo", {"", "/a", "/b"}}, {"video", {}}};
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.share);
+        ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg(c.share));
+        Json::Value description = ParseJson(R"({"config": []})");
+        description["queue"] = Queue(c.share);
+        for (const std::string &folder : c.folders) {
+            Json::Value entry = ParseJson(R"({"mask": 65486, "ignore": ["@eaDir"]})");
+            entry["path"] = SharePath(c.share) + folder;
+            description["config"].append(entry);
+        }
+        Json::Value expected = ParseJson(R"([null, "fileindex", 1])");
+        expected[0] = description;
+        EXPECT_EQ(Journal("MonitorQueue::Upsert").back()["args"], expected);
+    }
 }
 
 TEST_F(MonitorRegistrationTest, UnresolvableFolderAbortsBeforeTheNotificationDaemonIsCalled)
@@ -142,7 +147,7 @@ TEST_F(MonitorRegistrationTest, UnresolvableFolderAbortsBeforeTheNotificationDae
     SetFaults(ParseJson(R"({"VEXOShareGet": {"after": 4, "result": -1}})"));
     EXPECT_FALSE(IndexMgr::UpsertVNotifydCfg("photo"));
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"GetFullPath failed, path=/photo/b"});
-    EXPECT_TRUE(JournalOf("MonitorQueue::Upsert").empty());
+    EXPECT_TRUE(Journal("MonitorQueue::Upsert").empty());
 }
 
 TEST_F(MonitorRegistrationTest, RefusedDescriptionsAndRegistrationsFail)
@@ -150,12 +155,13 @@ TEST_F(MonitorRegistrationTest, RefusedDescriptionsAndRegistrationsFail)
     SetFaults(ParseJson(R"({"MonitorQueue::MonitorQueue": {"result": 0}})"));
     EXPECT_FALSE(IndexMgr::UpsertVNotifydCfg("photo"));
     EXPECT_TRUE(LogCapture::Lines().empty());
-    EXPECT_TRUE(JournalOf("MonitorQueue::Upsert").empty());
+    EXPECT_TRUE(Journal("MonitorQueue::Upsert").empty());
 
     SetFaults(ParseJson(R"({"MonitorQueue::Upsert": {"result": 0}, "MonitorQueue::Delete": {"result": 0}})"));
     EXPECT_FALSE(IndexMgr::UpsertVNotifydCfg("photo"));
     EXPECT_FALSE(IndexMgr::DeleteVNotifydCfg("photo"));
-    EXPECT_EQ(LogCapture::Messages(), (std::vector<std::string>{"MonitorQueue::Add failed", "MonitorQueue::Delete failed"}));
+    EXPECT_EQ(LogCapture::Messages(),
+              (std::vector<std::string>{"MonitorQueue::Add failed", "MonitorQueue::Delete failed"}));
 
     LogCapture::Clear();
     EXPECT_FALSE(IndexMgr::UpsertVNotifydCfg("nosuch"));
@@ -171,7 +177,9 @@ TEST_F(MonitorRegistrationTest, DeleteRemovesTheShareRegistration)
     ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg("photo"));
     ASSERT_TRUE(IndexMgr::UpsertVNotifydCfg("video"));
     ASSERT_TRUE(IndexMgr::DeleteVNotifydCfg("photo"));
-    EXPECT_EQ(JournalOf("MonitorQueue::Delete").at(0)["args"], ParseJson("[\"" + Queue("photo") + "\", \"fileindex\", 1]"));
+    Json::Value deleted = ParseJson(R"([null, "fileindex", 1])");
+    deleted[0] = Queue("photo");
+    EXPECT_EQ(Journal("MonitorQueue::Delete").at(0)["args"], deleted);
     const Json::Value registered = ParseJson(ReadFile(StatePath("monitor_queues.json")));
     EXPECT_EQ(registered["fileindex"].getMemberNames(), std::vector<std::string>{Queue("video")});
 }

@@ -113,21 +113,13 @@ void SandboxTest::SetFaults(const Json::Value &faults)
     WriteFile(StatePath("faults.json"), VEXO::FILEINDEX::toString(faults));
 }
 
-std::vector<Json::Value> SandboxTest::Journal()
+std::vector<Json::Value> SandboxTest::Journal(const std::string &op)
 {
     std::vector<Json::Value> entries;
     std::istringstream lines(ReadFile(StatePath("journal.jsonl")));
     for (std::string line; std::getline(lines, line);) {
-        entries.push_back(ParseJson(line));
-    }
-    return entries;
-}
-
-std::vector<Json::Value> SandboxTest::JournalOf(const std::string &op)
-{
-    std::vector<Json::Value> entries;
-    for (const Json::Value &entry : Journal()) {
-        if (entry["op"].asString() == op) {
+        const Json::Value entry = ParseJson(line);
+        if (op.empty() || entry["op"].asString() == op) {
             entries.push_back(entry);
         }
     }

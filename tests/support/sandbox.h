@@ -35,10 +35,9 @@ protected:
 
     // Forces platform results through the emulation's faults.json.
     static void SetFaults(const Json::Value &faults);
-    // The emulation's journal, one object per side-effecting platform call.
-    static std::vector<Json::Value> Journal();
-    // Journal entries of one operation.
-    static std::vector<Json::Value> JournalOf(const std::string &op);
+    // The emulation's journal, one object per side-effecting platform call (of the operation op
+    // only, when op is given).
+    static std::vector<Json::Value> Journal(const std::string &op = std::string());
 
 private:
     static std::vector<std::pair<std::string, std::string>> s_shares;
