@@ -4,7 +4,10 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <memory>
+#include <vector>
 
 #include "config/log.h"
 #include "fileindex/error.h"
@@ -23,6 +26,22 @@ namespace {
 constexpr int kShareNameSize = 492;
 constexpr int kSharePathSize = 4096;
 constexpr int kPlatformBadParameter = 0x0D00;
+constexpr int kRealpathSize = 4096;
+
+// VEXOGetFSType's answer when the type cannot be determined.
+constexpr int kFsTypeUnknown = -1;
+// A platform file-system type that is never indexed; treated like an image file system.
+constexpr int kFsTypeTreatedAsImage = 12;
+
+// Entry names that are never indexed: the platform's temporary and desktop litter, and what each
+// share keeps for the index itself. Built when the library is loaded; compared byte for byte.
+const std::vector<std::string> kPreservedFileNames = {
+    ".TemporaryItems", kDatabaseDirName, kQueueFileName, ".VEXOPPSDB", ".DS_Store",
+};
+// Shares that are never indexed (exact, case-sensitive names).
+const std::vector<std::string> kExcludedShareNames = {"surveillance", "NetBackup"};
+
+using ShareRecord = std::unique_ptr<VEXOSHARE, decltype(&VEXOShareFree)>;
 
 // Formats S/@eaDir/<name> of the share into out, making S/@eaDir (through a work buffer of 4096
 // bytes) and, for the database, the final directory on the way. The length written, or -1 when the
@@ -178,6 +197,143 @@ bool RetrieveBoolFromJsonObj(bool &value, const std::string &key, const Json::Va
     }
     value = member->asBool();
     return true;
+}
+
+// ---- Indexability ----
+
+namespace {
+
+bool Contains(const std::string &text, const char *part)
+{
+    return text.find(part) != std::string::npos;
+}
+
+// Recycle bins and snapshots are searched for in the text first, at any depth, and confirmed by
+// the platform.
+bool IsInRecycleBin(const std::string &fullPath)
+{
+    return Contains(fullPath, "#recycle") && VEXOShareIsShareRecycle(fullPath.c_str()) != 0;
+}
+
+bool IsInSnapshot(const std::string &fullPath)
+{
+    int inSnapshot = 0;
+    return Contains(fullPath, "#snapshot") && VLIBFhsPathInSnapshot(fullPath.c_str(), &inSnapshot) == 0 &&
+           inSnapshot == 1;
+}
+
+// Network file systems, file systems mounted from images, and type 12.
+bool IsFsTypeNeverIndexed(int fsType)
+{
+    return VEXOFSIsRemoteFS(fsType) != 0 || VEXOFSIsImageFS(fsType) != 0 || fsType == kFsTypeTreatedAsImage;
+}
+
+// A mount point may be indexed only inside a share that uses encryption (or whose encryption
+// cannot be told); elsewhere it is another volume grafted into the share.
+bool IsMountPointAllowed(const std::string &fullPath, VEXOSHARE *share)
+{
+    if (VEXOFSDirIsMntPoint(fullPath.c_str()) != 1) {
+        return true;
+    }
+    int usesEncryption = 0;
+    if (VLIBShareIsEncryptionGet(share, &usesEncryption) == 0 && usesEncryption == 0) {
+        FILEIDX_LOG("%s:%d Mount point[%s] is not allowed to be indexed", fullPath.c_str());
+        return false;
+    }
+    return true;
+}
+
+// The path must be its own canonical form: no symbolic link on the way, no "." or ".." components,
+// no doubled or trailing "/".
+bool IsCanonical(const std::string &fullPath)
+{
+    char canonical[kRealpathSize];
+    if (realpath(fullPath.c_str(), canonical) == nullptr || fullPath != canonical) {
+        FILEIDX_LOG("%s:%d check realpath failed, path=%s", fullPath.c_str());
+        return false;
+    }
+    return true;
+}
+
+}  // namespace
+
+bool IsSystemPreservedFileName(const std::string &name)
+{
+    if (VEXOEAIsHiddenDir(name.c_str()) == 1) {
+        return true;
+    }
+    for (const std::string &preserved : kPreservedFileNames) {
+        if (name == preserved) {
+            return true;
+        }
+    }
+    return false;
+}
+
+bool CanShareBeIndexed(_tag_VEXOSHARE *share)
+{
+    if (share == nullptr) {
+        return false;
+    }
+    for (const std::string &excluded : kExcludedShareNames) {
+        if (excluded == share->szName) {
+            return false;
+        }
+    }
+    int isEncrypted = 0;
+    int isReadOnly = 0;
+    if (VLIBShareIsEncryptedGet(share, &isEncrypted) < 0 || VLIBShareIsReadOnlyGet(share, &isReadOnly) < 0) {
+        return false;
+    }
+    return isEncrypted == 0 && isReadOnly == 0;
+}
+
+bool CanFullPathBeIndexed(const std::string &fullPath)
+{
+    if (IsInRecycleBin(fullPath) || IsInSnapshot(fullPath)) {
+        return false;
+    }
+    const int fsType = VEXOGetFSType(fullPath.c_str(), 0);
+    if (fsType == kFsTypeUnknown || IsFsTypeNeverIndexed(fsType)) {
+        return false;
+    }
+    std::string shareName;
+    std::string sharePath;
+    if (!GetShareNamePathByFullPath(shareName, sharePath, fullPath)) {
+        FILEIDX_LOG("%s:%d GetShareNamePathByFullPath failed, path=%s", fullPath.c_str());
+        return false;
+    }
+    PVEXOSHARE record = nullptr;
+    if (VEXOShareGet(shareName.c_str(), &record) < 0) {
+        FILEIDX_LOG("%s:%d VEXOShareGet failed, share=%s", shareName.c_str());
+        return false;
+    }
+    const ShareRecord share(record, &VEXOShareFree);
+    return CanShareBeIndexed(share.get()) && IsMountPointAllowed(fullPath, share.get()) && IsCanonical(fullPath);
+}
+
+bool CanPathBeIndexed(const std::string &path)
+{
+    std::string fullPath;
+    if (!GetFullPath(fullPath, path)) {
+        FILEIDX_LOG("%s:%d GetFullPath failed, path=%s", path.c_str());
+        ErrorHandler::SetError(FILEIDX_ERR_PATH);
+        return false;
+    }
+    return CanFullPathBeIndexed(fullPath);
+}
+
+bool IsSkipIndex(const std::string &fullPath)
+{
+    // The type is asked for first, whatever decides in the end.
+    const int fsType = VEXOGetFSType(fullPath.c_str(), 0);
+    const size_t lastSlash = fullPath.rfind('/');
+    if (lastSlash == std::string::npos || IsSystemPreservedFileName(fullPath.substr(lastSlash + 1)) ||
+        IsInRecycleBin(fullPath) || IsInSnapshot(fullPath)) {
+        return true;
+    }
+    // Unlike CanFullPathBeIndexed, the crawler keeps entries whose file system cannot be told.
+    return fsType != kFsTypeUnknown && IsFsTypeNeverIndexed(fsType);
 }
 
 }  // namespace FILEINDEX

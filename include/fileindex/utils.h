@@ -12,6 +12,9 @@
 
 #include "fileindex/export.h"
 
+// The platform's share record (platform/share_db.h), as VEXOShareGet returns it.
+struct _tag_VEXOSHARE;
+
 namespace VEXO {
 namespace FILEINDEX {
 
@@ -47,6 +50,46 @@ FILEINDEX_EXPORT bool IsFileExist(const std::string &path);
 // (respectively a boolean); otherwise false and value untouched. No conversions.
 FILEINDEX_EXPORT bool RetrieveStringFromJsonObj(std::string &value, const std::string &key, const Json::Value &object);
 FILEINDEX_EXPORT bool RetrieveBoolFromJsonObj(bool &value, const std::string &key, const Json::Value &object);
+
+// ---- What may be indexed ----
+// Only the lines named below are logged; every other refusal is a silent false and sets no error
+// code. Nothing here takes a lock or talks to the daemon.
+
+// True for the platform's hidden metadata directory names (VEXOEAIsHiddenDir) and for
+// ".TemporaryItems", "VEXO@.fileindexdb", "VEXO@file_index_queue", ".VEXOPPSDB", ".DS_Store"
+// (exact bytes: ".ds_store" is an ordinary name). name is one entry name, without its directory.
+FILEINDEX_EXPORT bool IsSystemPreservedFileName(const std::string &name);
+
+// False for a null record, for the shares "surveillance" and "NetBackup" (exact names), for a
+// share in the encrypted state or read-only, and when either state cannot be read. Logs nothing.
+FILEINDEX_EXPORT bool CanShareBeIndexed(_tag_VEXOSHARE *share);
+
+// Whether the folder at fullPath may be indexed. The tests run in this order; the first refusal
+// decides:
+//  1. in a share's recycle bin ("#recycle" in the path, confirmed by the platform);
+//  2. in a snapshot ("#snapshot" in the path, confirmed by the platform);
+//  3. file-system type unknown (-1); 4. a remote or image file system, or type 12;
+//  5. no share holds the path: "VEXOShareNamePathGet failed, path=..." then
+//     "GetShareNamePathByFullPath failed, path=<fullPath>", error 2 (FILEIDX_ERR_PATH);
+//  6. the share cannot be looked up: "VEXOShareGet failed, share=<name>";
+//  7. CanShareBeIndexed refuses the share;
+//  8. a mount point on a share that does not use encryption:
+//     "Mount point[<fullPath>] is not allowed to be indexed";
+//  9. fullPath is not its own canonical form (a symbolic link on the way, "." or "..", a doubled or
+//     trailing "/"), or does not exist: "check realpath failed, path=<fullPath>".
+// The share record is released on every path.
+FILEINDEX_EXPORT bool CanFullPathBeIndexed(const std::string &fullPath);
+
+// CanFullPathBeIndexed of the share-relative path's full path. When the path does not resolve:
+// false, "GetFullPath failed, path=<path>", error 2 (FILEIDX_ERR_PATH).
+FILEINDEX_EXPORT bool CanPathBeIndexed(const std::string &path);
+
+// Whether the crawler skips the entry at fullPath: true for a text without "/", a reserved last
+// component (IsSystemPreservedFileName; entries below a reserved directory are not caught here),
+// a recycle bin or snapshot, and a remote, image or type-12 file system. An entry whose
+// file-system type cannot be told is kept, unlike in CanFullPathBeIndexed. Asks the platform for
+// the type first, whatever decides. Logs nothing.
+FILEINDEX_EXPORT bool IsSkipIndex(const std::string &fullPath);
 
 // ---- Telling the indexing daemon ----
 
