@@ -1,12 +1,18 @@
 #include <cstdint>
 #include <ctime>
 #include <functional>
+#include <set>
 
+#include "config/file_io.h"
 #include "config/log.h"
 #include "config/unlock_on_return.h"
+#include "daemon/queue_record.h"
 #include "fileindex/error.h"
+#include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
+#include "share/share_lookup.h"
+#include "share/storage_paths.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -41,6 +47,62 @@ long long ResumeTimeAfter(int hours)
 {
     const uint32_t sum = static_cast<uint32_t>(time(nullptr)) + static_cast<uint32_t>(hours) * 3600u;
     return static_cast<int32_t>(sum);
+}
+
+// ---- Progress ----
+
+constexpr char kFinished[] = "finished";
+constexpr char kProcessing[] = "processing";
+constexpr char kPaused[] = "paused";
+constexpr char kNoSpace[] = "err_no_space";
+
+// What pending work shows as: "processing" unless indexing is paused, and a timed pause whose time
+// has come counts as over although the status file still holds it. -1 (running) is processing,
+// 0 (paused without end) paused.
+const char *PendingWord(long long resumeTime)
+{
+    const long long now = static_cast<long long>(time(nullptr));
+    return resumeTime != 0 && now >= resumeTime ? kProcessing : kPaused;
+}
+
+// The share's event queue file; false, logged, when the share is unknown.
+bool QueuePathOfShare(std::string &queue, const std::string &share)
+{
+    if (!GetQueuePath(queue, share)) {
+        FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
+        return false;
+    }
+    return true;
+}
+
+// True when the queue file holds an event on the folder or inside it (for a move, on either side).
+// A line that is not a queue record, a record being appended among them, is logged and passed over.
+bool HasPendingEventForFolder(const std::string &path, const std::string &queueFile)
+{
+    if (!IsFileExist(queueFile)) {
+        return false;
+    }
+    std::string fullPath;
+    if (!GetFullPath(fullPath, path)) {
+        FILEIDX_LOG("%s:%d Cannot get full path: %s", path.c_str());
+        return false;
+    }
+    const std::string folder = fullPath + "/";
+    bool found = false;
+    const bool read = ForEachLine(queueFile, [&](const std::string &line) {
+        QueueRecord record;
+        if (!ParseQueueRecord(line, record)) {
+            FILEIDX_LOG("%s:%d Malformed command: %s", line.c_str());
+            return true;
+        }
+        // pathOld is set for moves only.
+        found = StringStartWith(record.path + "/", folder) || StringStartWith(record.pathOld + "/", folder);
+        return !found;
+    });
+    if (!read) {
+        FILEIDX_LOG("%s:%d Failed to open queue=%s, reason=%m", queueFile.c_str());
+    }
+    return found;
 }
 
 }  // namespace
@@ -103,6 +165,71 @@ bool StatusMgr::Pause(const int &hours)
 bool StatusMgr::GetPauseInfo(long long &resumeTime)
 {
     return ReadStatus([&](Status &status) { return status.GetPauseInfo(resumeTime); });
+}
+
+bool StatusMgr::GetStatus(std::string &status)
+{
+    std::vector<Folder> folders;
+    if (!IndexMgr::List(folders)) {
+        return false;
+    }
+    std::set<std::string> shares;
+    for (const Folder &folder : folders) {
+        std::string share;
+        if (!GetShareNameByPath(share, folder.m_path)) {
+            FILEIDX_LOG("%s:%d Failed to get share name from path: %s", folder.m_path.c_str());
+            return false;
+        }
+        if (CanPathBeIndexed(folder.m_path)) {
+            shares.insert(share);
+        }
+    }
+    bool pending = false;
+    for (const std::string &share : shares) {
+        std::string queue;
+        if (!QueuePathOfShare(queue, share)) {
+            return false;
+        }
+        if (IsFileExist(queue) || IsFileExist(QueueCompanionPath(queue))) {
+            pending = true;
+            break;
+        }
+    }
+    if (!pending) {
+        status = kFinished;
+        return true;
+    }
+    long long resumeTime = -1;
+    if (!GetPauseInfo(resumeTime)) {
+        return false;
+    }
+    status = PendingWord(resumeTime);
+    return true;
+}
+
+std::string StatusMgr::GetFolderStatus(const std::string &path)
+{
+    if (!CanPathBeIndexed(path)) {
+        return kPaused;  // a folder that may not be indexed shows as paused, on purpose
+    }
+    std::string share;
+    if (!GetShareNameByPath(share, path)) {
+        FILEIDX_LOG("%s:%d Failed to get share name from path: %s", path.c_str());
+        return kFinished;
+    }
+    if (ShareIsNoSpace(share)) {
+        return kNoSpace;
+    }
+    std::string queue;
+    if (!QueuePathOfShare(queue, share)) {
+        return kFinished;
+    }
+    long long resumeTime = -1;  // stays "running" when the pause state cannot be read
+    GetPauseInfo(resumeTime);
+    if (HasPendingEventForFolder(path, queue) || HasPendingEventForFolder(path, QueueCompanionPath(queue))) {
+        return PendingWord(resumeTime);
+    }
+    return kFinished;
 }
 
 }  // namespace FILEINDEX

@@ -75,6 +75,30 @@ public:
     // Negative hours: false, error 1 (FILEIDX_ERR_BAD_PARAM), nothing locked, written or sent.
     static bool Pause(const int &hours);
     static bool GetPauseInfo(long long &resumeTime);
+
+    // ---- Progress ----
+    // Judged from the shares' event queue files (S/@eaDir/VEXO@file_index_queue and its ".tmp"
+    // companion) and the status file, without asking the daemon and without any lock. Pending work
+    // reads "processing" while indexing runs, also once a timed pause's time has come (the status
+    // file still holds it), and "paused" while a pause lasts. Getting a queue's path makes the
+    // share's @eaDir if it is missing.
+
+    // "finished" when no share holding a folder that may be indexed (CanPathBeIndexed) has a queue
+    // file; otherwise the pending word. Only the existence of the files counts, shares are looked
+    // at in ascending name order up to the first with one, and no-space marks are not considered.
+    // Failures, status untouched: folder.conf unreadable (error 6 or 8); a folder path without a
+    // share name, "Failed to get share name from path: <path>"; a share's queue unknown,
+    // "FILEIDXQueuePathGet failed, share=<share>"; the pause state unreadable with work pending.
+    static bool GetStatus(std::string &status);
+    // The state of one folder (share-relative path), in this order: "paused" when the folder may
+    // not be indexed; "err_no_space" when its share is marked out of space; the pending word when
+    // the share's queue file or its ".tmp" companion holds an event on the folder or inside it (a
+    // move, 256, counts on its "path_old" too); "finished" otherwise, also after
+    // "FILEIDXQueuePathGet failed, share=<share>" or "Cannot get full path: <path>". A queue line
+    // that is not a record logs "Malformed command: <line>" and is passed over; an unreadable queue
+    // logs "Failed to open queue=<file>, reason=<errno text>". An unreadable pause state counts as
+    // running.
+    static std::string GetFolderStatus(const std::string &path);
 };
 
 }  // namespace FILEINDEX
