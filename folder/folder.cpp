@@ -1,6 +1,9 @@
 #include "fileindex/folder.h"
 
+#include "config/json_io.h"
 #include "config/log.h"
+#include "fileindex/error.h"
+#include "fileindex/status.h"
 #include "fileindex/utils.h"
 
 namespace VEXO {
@@ -58,6 +61,53 @@ Json::Value Folder::asJson() const
     record["video"] = m_bVideo;
     record["photo"] = m_bPhoto;
     return record;
+}
+
+Json::Value Folder::asJson(const Json::Value &additional) const
+{
+    Json::Value record = asJson();
+    if (!GetAdditional(record["additional"], additional)) {
+        FILEIDX_LOG("%s:%d GetAdditional failed");
+    }
+    return record;
+}
+
+bool Folder::GetAdditional(Json::Value &out, const std::string &key) const
+{
+    if (key == "status") {
+        out = StatusMgr::GetFolderStatus(m_path);
+        return true;
+    }
+    if (key == "is_valid") {
+        out = CanPathBeIndexed(m_path);
+        return true;
+    }
+    FILEIDX_LOG("%s:%d Unknown additional: %s", key.c_str());
+    ErrorHandler::SetError(FILEIDX_ERR_BAD_PARAM);
+    return false;
+}
+
+bool Folder::GetAdditional(Json::Value &out, const Json::Value &keys) const
+{
+    out = Json::Value(Json::objectValue);
+    if (!keys.isArray()) {
+        FILEIDX_LOG("%s:%d Bad param: %s", toString(keys).c_str());
+        ErrorHandler::SetError(FILEIDX_ERR_BAD_PARAM);
+        return false;
+    }
+    for (const Json::Value &key : keys) {
+        if (!key.isString()) {
+            FILEIDX_LOG("%s:%d Bad param: %s", toString(key).c_str());
+            ErrorHandler::SetError(FILEIDX_ERR_BAD_PARAM);
+            return false;
+        }
+        // An unknown key stays in out as null and does not fail the list.
+        const std::string name = key.asString();
+        if (!GetAdditional(out[name], name)) {
+            FILEIDX_LOG("%s:%d Failed to get additional: %s", name.c_str());
+        }
+    }
+    return true;
 }
 
 bool Folder::AddToJson(Json::Value &object) const

@@ -1,18 +1,50 @@
 #include "fileindex/folder.h"
 
+#include <algorithm>
+
 #include "appliance_paths.h"
 #include "config/json_io.h"
 #include "config/log.h"
 #include "fileindex/error.h"
 #include "fileindex/utils.h"
 #include "folder/change_report.h"
+#include "platform/unicode.h"
 
 namespace VEXO {
 namespace FILEINDEX {
 
 namespace {
+
 constexpr size_t kMaxFolders = 1000;
-}
+
+// The ascending order of the paged listing for one sort key: "name" by display name, a media flag
+// with false before true, anything else by path; names and paths compared ignoring letter case.
+class CompareFolder {
+public:
+    explicit CompareFolder(const std::string &sortBy)
+        : m_text(sortBy == "name" ? &Folder::m_name : &Folder::m_path),
+          m_flag(sortBy == "document" ? &Folder::m_bDocument
+                 : sortBy == "audio"  ? &Folder::m_bAudio
+                 : sortBy == "video"  ? &Folder::m_bVideo
+                 : sortBy == "photo"  ? &Folder::m_bPhoto
+                                      : nullptr)
+    {
+    }
+
+    bool operator()(const Folder &a, const Folder &b) const
+    {
+        if (m_flag != nullptr) {
+            return !(a.*m_flag) && b.*m_flag;
+        }
+        return VLIBCUnicodeUTF8StrCaseCmp((a.*m_text).c_str(), (b.*m_text).c_str()) < 0;
+    }
+
+private:
+    std::string Folder::*m_text;
+    bool Folder::*m_flag;
+};
+
+}  // namespace
 
 std::string Folders::GetPath() const
 {
@@ -133,6 +165,35 @@ bool Folders::List(std::vector<Folder> &out, const std::string &share)
             out.push_back(entry.second);
         }
     }
+    return true;
+}
+
+bool Folders::List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
+                   const std::string &sort_direction, const Json::Value &additional)
+{
+    std::vector<Folder> sorted;
+    List(sorted);
+    out = Json::Value(Json::objectValue);
+    out["total"] = Json::UInt64(sorted.size());
+    out["offset"] = Json::UInt64(offset);
+    // Stable, so that folders the key does not tell apart stay in path order. A stable merge also
+    // never strays outside the vector when the platform's comparison is not a strict order (texts
+    // mixing valid and invalid UTF-8).
+    std::stable_sort(sorted.begin(), sorted.end(), CompareFolder(sort_by));
+
+    const unsigned long count = offset >= sorted.size() ? 0 : std::min<unsigned long>(sorted.size() - offset, limit);
+    Json::Value page(Json::arrayValue);
+    if (sort_direction == "DESC") {
+        // The first count folders of the ascending order, reversed; the offset is not applied.
+        for (unsigned long i = count; i-- > 0;) {
+            page.append(sorted[i].asJson(additional));
+        }
+    } else {
+        for (unsigned long i = 0; i < count; ++i) {
+            page.append(sorted[offset + i].asJson(additional));
+        }
+    }
+    out["folder"] = page;
     return true;
 }
 

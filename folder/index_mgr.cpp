@@ -11,6 +11,13 @@ bool IndexMgr::List(std::vector<Folder> &out)
     return folders.Load() && folders.List(out);
 }
 
+bool IndexMgr::List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
+                    const std::string &sort_direction, const Json::Value &additional)
+{
+    Folders folders;
+    return folders.Load() && folders.List(out, offset, limit, sort_by, sort_direction, additional);
+}
+
 bool IndexMgr::Get(Json::Value &out, const std::string &path)
 {
     Folders folders;

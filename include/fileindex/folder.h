@@ -35,6 +35,21 @@ public:
 
     // The JSON record; the full path is never part of it.
     Json::Value asJson() const;
+    // The record with "additional": GetAdditional(record["additional"], additional). When that
+    // fails, logs "GetAdditional failed" and returns the record with what it left there ({} for a
+    // key list that is not an array).
+    Json::Value asJson(const Json::Value &additional) const;
+
+    // Computed information about the folder: "status", its indexing state
+    // (StatusMgr::GetFolderStatus), or "is_valid", whether it may still be indexed
+    // (CanPathBeIndexed). Any other key: false, out untouched, error 1 (FILEIDX_ERR_BAD_PARAM),
+    // "Unknown additional: <key>". Pass a std::string: a bare literal also converts to Json::Value.
+    bool GetAdditional(Json::Value &out, const std::string &key) const;
+    // out = {key: value} for each key of the array keys, in order; an unknown key becomes null,
+    // logs "Failed to get additional: <key>" after the line above, and does not fail the call.
+    // keys not an array, or an element not a string: false, error 1, "Bad param: <that value>"; the
+    // members added before a bad element stay.
+    bool GetAdditional(Json::Value &out, const Json::Value &keys) const;
     // Sets object[path] to the record. False, object untouched, when object is not a JSON object.
     bool AddToJson(Json::Value &object) const;
 
@@ -86,6 +101,17 @@ public:
     // The folders of one share (exact, case-sensitive name); with "" all folders. Folders whose
     // share name cannot be cut from their path are left out of a per-share list.
     bool List(std::vector<Folder> &out, const std::string &share);
+
+    // A page of the table: out = {"total": all folders, "offset": offset, "folder": [records]},
+    // each record being asJson(additional). Sorted ascending by sort_by: "name" (display name),
+    // "document", "audio", "video" or "photo" (false before true), anything else by path; names
+    // and paths are compared ignoring letter case (VLIBCUnicodeUTF8StrCaseCmp), and folders the
+    // key does not tell apart stay in path order. The page holds the folders from offset on, at
+    // most limit of them (0 gives none, an offset at or past the end gives none). With
+    // sort_direction exactly "DESC" the page is instead the first min(total - offset, limit)
+    // folders of the ascending order, reversed: the offset only shortens it. Always true.
+    bool List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
+              const std::string &sort_direction, const Json::Value &additional);
 
 private:
     std::map<std::string, Folder> m_folders;

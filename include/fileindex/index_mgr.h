@@ -20,6 +20,11 @@ public:
     // All folder settings, in path order, read without the folder lock (a concurrent writer's save
     // is seen either whole or not at all). False with error 6 or 8 when folder.conf is unreadable.
     static bool List(std::vector<Folder> &out);
+    // A sorted page of the folder list with computed information, as Folders::List of the same form
+    // (see folder.h), read without the folder lock. False, out untouched, with error 6 or 8 when
+    // folder.conf is unreadable. "status" costs one progress query per folder on the page.
+    static bool List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
+                     const std::string &sort_direction, const Json::Value &additional);
     // One folder's record, read under the folder lock (the one reader that locks). Failures: error 9
     // when another process holds the lock, 6 or 8 when folder.conf is unreadable, 4 when the path
     // is not in the list.
