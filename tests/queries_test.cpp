@@ -8,8 +8,6 @@
 
 using namespace VEXO::FILEINDEX;
 
-extern "C" int fileidx_c_client_is_path_indexed(const char *path);
-
 namespace fileindex_test {
 namespace {
 
@@ -73,7 +71,6 @@ TEST_F(QueriesTest, QueriesReadTheFolderListAfreshAtEveryCall)
     EXPECT_EQ(FILEIDXIsPathIndexed("/photo/b"), 0);
     EXPECT_EQ(FILEIDXIsFullPathIndexed(HostPath("/volume1/photo/a/x").c_str()), 1);
     EXPECT_EQ(FILEIDXIsFullPathIndexed(HostPath("/volume1/photo").c_str()), 0);
-    EXPECT_EQ(fileidx_c_client_is_path_indexed("/photo/a/deep/er"), 1);
 }
 
 TEST_F(QueriesTest, ShareIsIndexedByExactNameAndUnnamedFoldersArePassedOver)
