@@ -66,7 +66,14 @@ bool Status::SetUpdated(const std::string &name)
 
 bool Status::IsUpdated(const std::string &name)
 {
-    return m_jsConfig.isMember(name) && m_jsConfig[name].asBool();
+    // The share marks share the top level with the updated marks: asked about as an updated mark,
+    // a member the JSON library cannot read as a boolean (an object, a text) is none, rather than
+    // an exception out of the library.
+    if (!m_jsConfig.isMember(name)) {
+        return false;
+    }
+    const Json::Value &member = m_jsConfig[name];
+    return member.isConvertibleTo(Json::booleanValue) && member.asBool();
 }
 
 bool Status::ShareSetNeedReindex(const std::string &share, bool flag)

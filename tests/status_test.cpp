@@ -57,14 +57,15 @@ protected:
 
 TEST_F(StatusTest, UpdatedMarksFollowTheJsonBooleanReading)
 {
-    WriteFile(kStatusConf, R"({"one":1,"zero":0,"no":false})");
+    WriteFile(kStatusConf, R"({"one":1,"zero":0,"no":false,"no_space":{"photo":true}})");
     EXPECT_TRUE(StatusMgr::IsUpdated("one"));
+    EXPECT_FALSE(StatusMgr::IsUpdated("no_space"));
     EXPECT_FALSE(StatusMgr::IsUpdated("zero"));
     EXPECT_FALSE(StatusMgr::IsUpdated("no"));
     EXPECT_FALSE(StatusMgr::IsUpdated("absent"));
     ASSERT_TRUE(StatusMgr::SetUpdated("no"));
     EXPECT_TRUE(StatusMgr::IsUpdated("no"));
-    EXPECT_EQ(Stored(), ParseJson(R"({"one":1,"zero":0,"no":true})"));
+    EXPECT_EQ(Stored(), ParseJson(R"({"one":1,"zero":0,"no":true,"no_space":{"photo":true}})"));
 }
 
 TEST_F(StatusTest, ClearingAnAbsentMarkLeavesANullThatMarksNoShare)

@@ -29,7 +29,8 @@ public:
 
     // Sets the top-level member name to true. There is no way to clear it.
     bool SetUpdated(const std::string &name);
-    // True when the member exists and the JSON library reads it as true.
+    // True when the member exists and the JSON library reads it as true. A member it cannot read as
+    // a boolean ("no_space", "need_reindex", a text) is no updated mark: false.
     bool IsUpdated(const std::string &name);
 
     // Adds or removes share in "need_reindex". Removing from an absent object leaves
