@@ -1,11 +1,14 @@
 // fileindex-standin-daemon: listens on the indexing daemon's socket in its place and appends one
 // line per command received, the command's JSON text exactly as it arrived, to a file or to
 // standard output. A frame that breaks the framing rules is written as {"malformed": reason}.
+// With --process-queues it also works through the shares' event queues as fileindexd would
+// (standin_queue_worker.h), so that indexing progress moves on to "finished".
 //
 // Frame: a 4-byte length in host byte order counting the terminating NUL, the JSON text, the NUL.
 // One frame per connection. The socket appears only once it accepts connections, so a program
 // that waits for the socket file may send at once.
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -24,8 +27,12 @@
 #include <json/writer.h>
 
 #include "appliance_paths.h"
+#include "standin_queue_worker.h"
 
 namespace {
+
+// How often the queue worker looks for work while no command arrives.
+constexpr int kStepMilliseconds = 50;
 
 volatile sig_atomic_t g_stop = 0;
 
@@ -50,13 +57,12 @@ bool ReadExactly(int fd, char *buffer, size_t size)
     return true;
 }
 
-bool IsJsonText(const std::string &text)
+bool ParseJson(const std::string &text, Json::Value &value)
 {
     Json::CharReaderBuilder builder;
     Json::CharReaderBuilder::strictMode(&builder.settings_);
     builder["strictRoot"] = false;
     std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    Json::Value value;
     return reader->parse(text.data(), text.data() + text.size(), &value, nullptr);
 }
 
@@ -97,7 +103,8 @@ std::string ReadFrame(int fd)
         return Malformed("text not terminated by NUL");
     }
     payload.pop_back();
-    if (payload.find('\0') != std::string::npos || !IsJsonText(payload)) {
+    Json::Value command;
+    if (payload.find('\0') != std::string::npos || !ParseJson(payload, command)) {
         return Malformed("not JSON text");
     }
     return payload;
@@ -130,9 +137,15 @@ int main(int argc, char **argv)
     std::string socketPath = FILEINDEX_DAEMON_SOCKET_PATH;
     std::string outputPath;
     int count = 0;
+    bool processQueues = false;
+    int recordMilliseconds = 300;
     app.add_option("--socket", socketPath, "socket to listen on")->capture_default_str();
     app.add_option("--output", outputPath, "file to append command lines to (default: standard output)");
     app.add_option("--count", count, "exit after this many commands (default: run until SIGTERM)");
+    app.add_flag("--process-queues", processQueues, "work through the shares' event queues as fileindexd would");
+    app.add_option("--record-time", recordMilliseconds, "milliseconds one queue record takes")
+        ->capture_default_str()
+        ->check(CLI::NonNegativeNumber);
     CLI11_PARSE(app, argc, argv);
 
     struct sigaction action = {};
@@ -153,7 +166,15 @@ int main(int argc, char **argv)
         std::cerr << "cannot listen on " << socketPath << ": " << strerror(errno) << "\n";
         return 1;
     }
+    fileindex_standin::QueueWorker worker{std::chrono::milliseconds(recordMilliseconds)};
     for (int received = 0; !g_stop && (count == 0 || received < count);) {
+        if (processQueues) {
+            worker.Step();
+            pollfd waiting = {listener, POLLIN, 0};
+            if (poll(&waiting, 1, kStepMilliseconds) <= 0) {
+                continue;
+            }
+        }
         const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
         if (connection < 0) {
             continue;
@@ -162,6 +183,10 @@ int main(int argc, char **argv)
         close(connection);
         if (line.empty()) {
             continue;
+        }
+        Json::Value command;
+        if (processQueues && ParseJson(line, command)) {
+            worker.OnCommand(command);
         }
         line += '\n';
         if (write(output, line.data(), line.size()) != static_cast<ssize_t>(line.size())) {
