@@ -222,10 +222,17 @@ bool IsInSnapshot(const std::string &fullPath)
            inSnapshot == 1;
 }
 
-// Network file systems, file systems mounted from images, and type 12.
-bool IsFsTypeNeverIndexed(int fsType)
+// Network file systems, file systems mounted from images, and type 12 are never indexed; the
+// platform is asked in this order, and no further once one says yes.
+IndexRefusal GetFsTypeRefusal(int fsType)
 {
-    return VEXOFSIsRemoteFS(fsType) != 0 || VEXOFSIsImageFS(fsType) != 0 || fsType == kFsTypeTreatedAsImage;
+    if (VEXOFSIsRemoteFS(fsType) != 0) {
+        return IndexRefusal::kRemoteFileSystem;
+    }
+    if (VEXOFSIsImageFS(fsType) != 0) {
+        return IndexRefusal::kImageFileSystem;
+    }
+    return fsType == kFsTypeTreatedAsImage ? IndexRefusal::kFileSystemType12 : IndexRefusal::kNone;
 }
 
 // A mount point may be indexed only inside a share that uses encryption (or whose encryption
@@ -270,70 +277,114 @@ bool IsSystemPreservedFileName(const std::string &name)
     return false;
 }
 
-bool CanShareBeIndexed(_tag_VEXOSHARE *share)
+IndexRefusal GetShareIndexRefusal(_tag_VEXOSHARE *share)
 {
     if (share == nullptr) {
-        return false;
+        return IndexRefusal::kShareLookupFailed;
     }
     for (const std::string &excluded : kExcludedShareNames) {
         if (excluded == share->szName) {
-            return false;
+            return IndexRefusal::kExcludedShare;
         }
     }
     int isEncrypted = 0;
     int isReadOnly = 0;
     if (VLIBShareIsEncryptedGet(share, &isEncrypted) < 0 || VLIBShareIsReadOnlyGet(share, &isReadOnly) < 0) {
-        return false;
+        return IndexRefusal::kShareStateUnreadable;
     }
-    return isEncrypted == 0 && isReadOnly == 0;
+    return isEncrypted != 0  ? IndexRefusal::kEncryptedShare
+           : isReadOnly != 0 ? IndexRefusal::kReadOnlyShare
+                             : IndexRefusal::kNone;
 }
 
-bool CanFullPathBeIndexed(const std::string &fullPath)
+bool CanShareBeIndexed(_tag_VEXOSHARE *share)
 {
-    if (IsInRecycleBin(fullPath) || IsInSnapshot(fullPath)) {
-        return false;
+    return GetShareIndexRefusal(share) == IndexRefusal::kNone;
+}
+
+IndexRefusal GetFullPathIndexRefusal(const std::string &fullPath)
+{
+    if (IsInRecycleBin(fullPath)) {
+        return IndexRefusal::kRecycleBin;
+    }
+    if (IsInSnapshot(fullPath)) {
+        return IndexRefusal::kSnapshot;
     }
     const int fsType = VEXOGetFSType(fullPath.c_str(), 0);
-    if (fsType == kFsTypeUnknown || IsFsTypeNeverIndexed(fsType)) {
-        return false;
+    if (fsType == kFsTypeUnknown) {
+        return IndexRefusal::kUnknownFileSystem;
+    }
+    const IndexRefusal fsRefusal = GetFsTypeRefusal(fsType);
+    if (fsRefusal != IndexRefusal::kNone) {
+        return fsRefusal;
     }
     std::string shareName;
     std::string sharePath;
     if (!GetShareNamePathByFullPath(shareName, sharePath, fullPath)) {
         FILEIDX_LOG("%s:%d GetShareNamePathByFullPath failed, path=%s", fullPath.c_str());
-        return false;
+        return IndexRefusal::kNoShare;
     }
     PVEXOSHARE record = nullptr;
     if (VEXOShareGet(shareName.c_str(), &record) < 0) {
         FILEIDX_LOG("%s:%d VEXOShareGet failed, share=%s", shareName.c_str());
-        return false;
+        return IndexRefusal::kShareLookupFailed;
     }
     const ShareRecord share(record, &VEXOShareFree);
-    return CanShareBeIndexed(share.get()) && IsMountPointAllowed(fullPath, share.get()) && IsCanonical(fullPath);
+    const IndexRefusal shareRefusal = GetShareIndexRefusal(share.get());
+    if (shareRefusal != IndexRefusal::kNone) {
+        return shareRefusal;
+    }
+    if (!IsMountPointAllowed(fullPath, share.get())) {
+        return IndexRefusal::kMountPoint;
+    }
+    return IsCanonical(fullPath) ? IndexRefusal::kNone : IndexRefusal::kNotCanonical;
 }
 
-bool CanPathBeIndexed(const std::string &path)
+bool CanFullPathBeIndexed(const std::string &fullPath)
+{
+    return GetFullPathIndexRefusal(fullPath) == IndexRefusal::kNone;
+}
+
+IndexRefusal GetPathIndexRefusal(const std::string &path)
 {
     std::string fullPath;
     if (!GetFullPath(fullPath, path)) {
         FILEIDX_LOG("%s:%d GetFullPath failed, path=%s", path.c_str());
         ErrorHandler::SetError(FILEIDX_ERR_PATH);
-        return false;
+        return IndexRefusal::kPathUnresolved;
     }
-    return CanFullPathBeIndexed(fullPath);
+    return GetFullPathIndexRefusal(fullPath);
 }
 
-bool IsSkipIndex(const std::string &fullPath)
+bool CanPathBeIndexed(const std::string &path)
+{
+    return GetPathIndexRefusal(path) == IndexRefusal::kNone;
+}
+
+IndexRefusal GetSkipIndexRefusal(const std::string &fullPath)
 {
     // The type is asked for first, whatever decides in the end.
     const int fsType = VEXOGetFSType(fullPath.c_str(), 0);
     const size_t lastSlash = fullPath.rfind('/');
-    if (lastSlash == std::string::npos || IsSystemPreservedFileName(fullPath.substr(lastSlash + 1)) ||
-        IsInRecycleBin(fullPath) || IsInSnapshot(fullPath)) {
-        return true;
+    if (lastSlash == std::string::npos) {
+        return IndexRefusal::kNoDirectory;
+    }
+    if (IsSystemPreservedFileName(fullPath.substr(lastSlash + 1))) {
+        return IndexRefusal::kReservedName;
+    }
+    if (IsInRecycleBin(fullPath)) {
+        return IndexRefusal::kRecycleBin;
+    }
+    if (IsInSnapshot(fullPath)) {
+        return IndexRefusal::kSnapshot;
     }
     // Unlike CanFullPathBeIndexed, the crawler keeps entries whose file system cannot be told.
-    return fsType != kFsTypeUnknown && IsFsTypeNeverIndexed(fsType);
+    return fsType == kFsTypeUnknown ? IndexRefusal::kNone : GetFsTypeRefusal(fsType);
+}
+
+bool IsSkipIndex(const std::string &fullPath)
+{
+    return GetSkipIndexRefusal(fullPath) != IndexRefusal::kNone;
 }
 
 }  // namespace FILEINDEX

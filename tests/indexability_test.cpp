@@ -9,6 +9,7 @@
 #include "tests/support/sandbox.h"
 
 using namespace VEXO::FILEINDEX;
+using R = IndexRefusal;
 
 namespace fileindex_test {
 namespace {
@@ -44,49 +45,53 @@ TEST_F(IndexabilityTest, FirstRefusalDecidesWithItsLogLineOrSilence)
         std::string faults;  // "%s" stands for the path passed, in faults and log
         const char *path;    // below the sandbox root, or share-relative when relative
         bool relative;
-        bool allowed;
+        IndexRefusal refusal;
         const char *log;  // the messages, one per line; "" for none
         bool pathError;   // error 2 (FILEIDX_ERR_PATH) set
     } cases[] = {
-        {"{}", "/volume1/photo/a", false, true, "", false},
-        {"{}", "/volume1/photo/a/", false, false, kRealpath, false},
-        {"{}", "/volume1/photo//a", false, false, kRealpath, false},
-        {"{}", "/volume1/photo/a/../a", false, false, kRealpath, false},
-        {"{}", "/volume1/photo/link", false, false, kRealpath, false},
-        {"{}", "/volume1/photo/#recycle//a", false, false, "", false},  // refused before the doubled "/" counts
-        {"{}", "/volume1/photo/#snapshot//s", false, false, "", false},
-        {"{}", "/volume1/photo/missing", false, false, "", false},  // type unknown
-        {R"({"VEXOGetFSType": {"match": "%s", "result": 8}})", "/volume1/photo/a", false, false, "", false},
-        {R"({"VEXOGetFSType": {"match": "%s", "result": 11}})", "/volume1/photo/a", false, false, "", false},
-        {R"({"VEXOGetFSType": {"match": "%s", "result": 12}})", "/volume1/photo/a", false, false, "", false},
-        {"{}", "/volume1", false, false,
+        {"{}", "/volume1/photo/a", false, R::kNone, "", false},
+        {"{}", "/volume1/photo/a/", false, R::kNotCanonical, kRealpath, false},
+        {"{}", "/volume1/photo//a", false, R::kNotCanonical, kRealpath, false},
+        {"{}", "/volume1/photo/a/../a", false, R::kNotCanonical, kRealpath, false},
+        {"{}", "/volume1/photo/link", false, R::kNotCanonical, kRealpath, false},
+        {"{}", "/volume1/photo/#recycle//a", false, R::kRecycleBin, "", false},  // refused before the doubled "/" counts
+        {"{}", "/volume1/photo/#snapshot//s", false, R::kSnapshot, "", false},
+        {"{}", "/volume1/photo/missing", false, R::kUnknownFileSystem, "", false},  // type unknown
+        {R"({"VEXOGetFSType": {"match": "%s", "result": 8}})", "/volume1/photo/a", false, R::kRemoteFileSystem, "", false},
+        {R"({"VEXOGetFSType": {"match": "%s", "result": 11}})", "/volume1/photo/a", false, R::kImageFileSystem, "", false},
+        {R"({"VEXOGetFSType": {"match": "%s", "result": 12}})", "/volume1/photo/a", false, R::kFileSystemType12, "", false},
+        {"{}", "/volume1", false, R::kNoShare,
          "VEXOShareNamePathGet failed, path=%s\nGetShareNamePathByFullPath failed, path=%s", true},
-        {R"({"VEXOShareGet": {"match": "photo", "result": -1}})", "/volume1/photo/a", false, false,
+        {R"({"VEXOShareGet": {"match": "photo", "result": -1}})", "/volume1/photo/a", false, R::kShareLookupFailed,
          "VEXOShareGet failed, share=photo", false},
-        {"{}", "/volume1/locked", false, false, "", false},
-        {"{}", "/volume1/ro", false, false, "", false},
-        {"{}", "/volume1/NetBackup", false, false, "", false},
-        {"{}", "/volume1/Surveillance", false, true, "", false},  // only "surveillance" is excluded
-        {R"({"VLIBShareIsReadOnlyGet": {"result": -1}})", "/volume1/photo/a", false, false, "", false},
-        {std::string(kMount) + "}", "/volume1/photo/a", false, false, "Mount point[%s] is not allowed to be indexed", false},
-        {std::string(kMount) + R"(, "VLIBShareIsEncryptionGet": {"result": -1}})", "/volume1/photo/a", false, true, "", false},
-        {std::string(kMount) + "}", "/volume1/vault", false, true, "", false},
-        {"{}", "/photo/a", true, true, "", false},
-        {"{}", "/ro", true, false, "", false},
-        {"{}", "/nosuch/a", true, false, "GetFullPath failed, path=%s", true},
+        {"{}", "/volume1/locked", false, R::kEncryptedShare, "", false},
+        {"{}", "/volume1/ro", false, R::kReadOnlyShare, "", false},
+        {"{}", "/volume1/NetBackup", false, R::kExcludedShare, "", false},
+        {"{}", "/volume1/Surveillance", false, R::kNone, "", false},  // only "surveillance" is excluded
+        {R"({"VLIBShareIsReadOnlyGet": {"result": -1}})", "/volume1/photo/a", false, R::kShareStateUnreadable, "", false},
+        {std::string(kMount) + "}", "/volume1/photo/a", false, R::kMountPoint, "Mount point[%s] is not allowed to be indexed", false},
+        {std::string(kMount) + R"(, "VLIBShareIsEncryptionGet": {"result": -1}})", "/volume1/photo/a", false, R::kNone, "", false},
+        {std::string(kMount) + "}", "/volume1/vault", false, R::kNone, "", false},
+        {"{}", "/photo/a", true, R::kNone, "", false},
+        {"{}", "/ro", true, R::kReadOnlyShare, "", false},
+        {"{}", "/nosuch/a", true, R::kPathUnresolved, "GetFullPath failed, path=%s", true},
     };
     for (const auto &c : cases) {
         const std::string path = c.relative ? c.path : HostPath(c.path);
         SetFaults(ParseJson(Fill(c.faults, path)));
         LogCapture::Clear();
         ErrorHandler::SetError(FILEIDX_ERR_NONE);
-        EXPECT_EQ(c.relative ? CanPathBeIndexed(path) : CanFullPathBeIndexed(path), c.allowed) << path << c.faults;
+        const std::string row = path + " " + c.faults + " " + IndexRefusalName(c.refusal);
+        EXPECT_EQ(c.relative ? CanPathBeIndexed(path) : CanFullPathBeIndexed(path), c.refusal == R::kNone) << row;
         std::string log;
         for (const std::string &message : LogCapture::Messages()) {
             log += (log.empty() ? "" : "\n") + message;
         }
         EXPECT_EQ(log, Fill(c.log, path)) << path << c.faults;
         EXPECT_EQ(ErrorHandler::GetError(), c.pathError ? FILEIDX_ERR_PATH : FILEIDX_ERR_NONE) << path << c.faults;
+        // The reason comes from the same rules: the same answer, from the same platform answers.
+        const IndexRefusal refusal = c.relative ? GetPathIndexRefusal(path) : GetFullPathIndexRefusal(path);
+        EXPECT_STREQ(IndexRefusalName(refusal), IndexRefusalName(c.refusal)) << row;
     }
     EXPECT_FALSE(CanShareBeIndexed(nullptr));
 }
@@ -96,21 +101,22 @@ TEST_F(IndexabilityTest, CrawlerSkipsReservedNamesAndForeignFileSystemsButKeepsA
     const struct {
         const char *faults;
         std::string path;
-        bool skip;
+        IndexRefusal refusal;
     } cases[] = {
-        {"{}", "no-slash", true},
-        {"{}", HostPath("/volume1/photo/a"), false},
-        {"{}", HostPath("/volume1/photo/.TemporaryItems"), true},
-        {"{}", HostPath("/volume1/photo/.TemporaryItems/a"), false},  // only the last component counts
-        {"{}", HostPath("/volume1/photo/.ds_store"), false},
-        {"{}", HostPath("/volume1/photo/#recycle/a"), true},
-        {"{}", HostPath("/volume1/photo/#snapshot/s"), true},
-        {"{}", HostPath("/volume1/photo/missing"), false},  // type unknown: kept
-        {R"({"VEXOGetFSType": {"result": 12}})", HostPath("/volume1/photo/a"), true},
+        {"{}", "no-slash", R::kNoDirectory},
+        {"{}", HostPath("/volume1/photo/a"), R::kNone},
+        {"{}", HostPath("/volume1/photo/.TemporaryItems"), R::kReservedName},
+        {"{}", HostPath("/volume1/photo/.TemporaryItems/a"), R::kNone},  // only the last component counts
+        {"{}", HostPath("/volume1/photo/.ds_store"), R::kNone},
+        {"{}", HostPath("/volume1/photo/#recycle/a"), R::kRecycleBin},
+        {"{}", HostPath("/volume1/photo/#snapshot/s"), R::kSnapshot},
+        {"{}", HostPath("/volume1/photo/missing"), R::kNone},  // type unknown: kept
+        {R"({"VEXOGetFSType": {"result": 12}})", HostPath("/volume1/photo/a"), R::kFileSystemType12},
     };
     for (const auto &c : cases) {
         SetFaults(ParseJson(c.faults));
-        EXPECT_EQ(IsSkipIndex(c.path), c.skip) << c.path << " " << c.faults;
+        EXPECT_EQ(IsSkipIndex(c.path), c.refusal != R::kNone) << c.path << " " << c.faults;
+        EXPECT_STREQ(IndexRefusalName(GetSkipIndexRefusal(c.path)), IndexRefusalName(c.refusal)) << c.path;
     }
     EXPECT_TRUE(LogCapture::Lines().empty());
     for (const char *name : {".TemporaryItems", "VEXO@.fileindexdb", "VEXO@file_index_queue", ".VEXOPPSDB", ".DS_Store", "@eaDir"}) {

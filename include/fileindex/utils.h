@@ -6,6 +6,7 @@
 #ifndef FILEINDEX_UTILS_H
 #define FILEINDEX_UTILS_H
 
+#include <cstdint>
 #include <string>
 
 #include <json/value.h>
@@ -60,9 +61,41 @@ FILEINDEX_EXPORT bool RetrieveBoolFromJsonObj(bool &value, const std::string &ke
 // (exact bytes: ".ds_store" is an ordinary name). name is one entry name, without its directory.
 FILEINDEX_EXPORT bool IsSystemPreservedFileName(const std::string &name);
 
+// The rule that refuses a share, a folder or a crawled entry; kNone when none does. The Can...
+// and IsSkipIndex functions below answer from the same code as the Get...Refusal functions, so the
+// answer and the reason never disagree.
+enum class IndexRefusal : int32_t {
+    kNone = 0,
+    kRecycleBin = 1,            // in a share's recycle bin
+    kSnapshot = 2,              // in a snapshot
+    kUnknownFileSystem = 3,     // the file-system type cannot be told
+    kRemoteFileSystem = 4,      // a network file system
+    kImageFileSystem = 5,       // a file system mounted from an image
+    kFileSystemType12 = 6,      // the platform's file-system type 12
+    kNoShare = 7,               // no share holds the path
+    kShareLookupFailed = 8,     // the share cannot be looked up (or no share record was given)
+    kExcludedShare = 9,         // "surveillance" or "NetBackup"
+    kShareStateUnreadable = 10, // the share's encrypted or read-only state cannot be read
+    kEncryptedShare = 11,       // the share is in the encrypted state
+    kReadOnlyShare = 12,        // the share is read-only
+    kMountPoint = 13,           // a mount point in a share that does not use encryption
+    kNotCanonical = 14,         // not its own canonical path (link, ".", "..", "//", trailing "/"), or missing
+    kPathUnresolved = 15,       // the share-relative path does not resolve to a full path
+    kNoDirectory = 16,          // a crawled entry's path without any "/"
+    kReservedName = 17,         // a crawled entry's name is reserved (IsSystemPreservedFileName)
+};
+
+// A stable lower-case name of the refusal for scripts ("recycle_bin", "none", ...), and a phrase
+// for people ("in a share's recycle bin"). Never null.
+FILEINDEX_EXPORT const char *IndexRefusalName(IndexRefusal refusal);
+FILEINDEX_EXPORT const char *IndexRefusalText(IndexRefusal refusal);
+
 // False for a null record, for the shares "surveillance" and "NetBackup" (exact names), for a
 // share in the encrypted state or read-only, and when either state cannot be read. Logs nothing.
 FILEINDEX_EXPORT bool CanShareBeIndexed(_tag_VEXOSHARE *share);
+// The rule behind CanShareBeIndexed: kShareLookupFailed for a null record, kExcludedShare,
+// kShareStateUnreadable, kEncryptedShare, kReadOnlyShare, or kNone.
+FILEINDEX_EXPORT IndexRefusal GetShareIndexRefusal(_tag_VEXOSHARE *share);
 
 // Whether the folder at fullPath may be indexed. The tests run in this order; the first refusal
 // decides:
@@ -79,10 +112,14 @@ FILEINDEX_EXPORT bool CanShareBeIndexed(_tag_VEXOSHARE *share);
 //     trailing "/"), or does not exist: "check realpath failed, path=<fullPath>".
 // The share record is released on every path.
 FILEINDEX_EXPORT bool CanFullPathBeIndexed(const std::string &fullPath);
+// The rule behind CanFullPathBeIndexed, with the same platform calls, log lines and error code.
+FILEINDEX_EXPORT IndexRefusal GetFullPathIndexRefusal(const std::string &fullPath);
 
 // CanFullPathBeIndexed of the share-relative path's full path. When the path does not resolve:
 // false, "GetFullPath failed, path=<path>", error 2 (FILEIDX_ERR_PATH).
 FILEINDEX_EXPORT bool CanPathBeIndexed(const std::string &path);
+// The rule behind CanPathBeIndexed: kPathUnresolved, or GetFullPathIndexRefusal of the full path.
+FILEINDEX_EXPORT IndexRefusal GetPathIndexRefusal(const std::string &path);
 
 // Whether the crawler skips the entry at fullPath: true for a text without "/", a reserved last
 // component (IsSystemPreservedFileName; entries below a reserved directory are not caught here),
@@ -90,6 +127,9 @@ FILEINDEX_EXPORT bool CanPathBeIndexed(const std::string &path);
 // file-system type cannot be told is kept, unlike in CanFullPathBeIndexed. Asks the platform for
 // the type first, whatever decides. Logs nothing.
 FILEINDEX_EXPORT bool IsSkipIndex(const std::string &fullPath);
+// The rule behind IsSkipIndex: kNoDirectory, kReservedName, kRecycleBin, kSnapshot,
+// kRemoteFileSystem, kImageFileSystem, kFileSystemType12, or kNone for an entry the crawler keeps.
+FILEINDEX_EXPORT IndexRefusal GetSkipIndexRefusal(const std::string &fullPath);
 
 // ---- Telling the indexing daemon ----
 
