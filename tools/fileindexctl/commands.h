@@ -22,6 +22,7 @@ CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name
                      std::function<int()> run);
 
 void AddFolderCommands(CLI::App &app, Context &context);
+void AddIndexCommands(CLI::App &app, Context &context);
 void AddStatusCommands(CLI::App &app, Context &context);
 void AddShareCommands(CLI::App &app, Context &context);
 

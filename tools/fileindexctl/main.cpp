@@ -38,6 +38,7 @@ int main(int argc, char **argv)
 
     Context context;
     AddFolderCommands(app, context);
+    AddIndexCommands(app, context);
     AddStatusCommands(app, context);
     AddShareCommands(app, context);
 

@@ -68,7 +68,7 @@ void Table::Add(std::vector<std::string> row)
     m_rows.push_back(std::move(row));
 }
 
-void Table::Print() const
+void Table::Print(std::ostream &out) const
 {
     std::vector<size_t> widths;
     for (const std::vector<std::string> &row : m_rows) {
@@ -85,7 +85,7 @@ void Table::Print() const
                 line.append(widths[i] - DisplayWidth(row[i]) + 2, ' ');
             }
         }
-        std::cout << line << "\n";
+        out << line << "\n";
     }
 }
 

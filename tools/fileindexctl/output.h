@@ -3,6 +3,7 @@
 #ifndef FILEINDEXCTL_OUTPUT_H
 #define FILEINDEXCTL_OUTPUT_H
 
+#include <iostream>
 #include <string>
 #include <vector>
 
@@ -25,7 +26,7 @@ class Table {
 public:
     explicit Table(std::vector<std::string> header);
     void Add(std::vector<std::string> row);
-    void Print() const;
+    void Print(std::ostream &out = std::cout) const;
 
 private:
     std::vector<std::vector<std::string>> m_rows;
