@@ -8,8 +8,14 @@
 #include <syslog.h>
 
 #include "fileindex/error.h"
+#include "platform/error_state.h"
 
 #define FILEIDX_LOG(format, ...) ::syslog(LOG_ERR, format, __FILE_NAME__, __LINE__, ##__VA_ARGS__)
+
+// A platform call failed: format ends in "err=[0x%04X %s:%d]", which takes the platform's last
+// error code and the source file and line the platform reports for it.
+#define FILEIDX_LOG_PLATFORM_ERROR(format) \
+    FILEIDX_LOG(format, static_cast<unsigned>(VLIBCErrGet()), VLIBCErrorGetFile(), VLIBCErrorGetLine())
 
 // Debug lines are still written at LOG_ERR, and only while LOG_LEVEL is exactly LOG_DEBUG.
 #define FILEIDX_DEBUG(format, ...)                                 \

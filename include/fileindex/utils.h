@@ -160,6 +160,19 @@ FILEINDEX_EXPORT bool IsShareSpaceEnough(const std::string &share);
 // "/usr/vexo/bin/vexohvxnotify". True when the tool ran successfully. Logs nothing.
 FILEINDEX_EXPORT bool NotifyNoSpace();
 
+// ---- Upgrade ----
+
+// Brings the indexing service in line with folder.conf after a system upgrade; reads it without the
+// folder lock and changes nothing in it. With no folder, fileindexd is stopped (a failure logs
+// "VLIBServiceStart failed: err=[...]", the start's text, and answers false). Otherwise, stopping
+// at the first failure and undoing nothing: fileindexd started ("VLIBServiceStart failed:
+// err=[...]"); SMB Spotlight switched on, without a "samba" restart ("VEXOSMBSetSpotlight failed:
+// err=[...]"); every share holding folders registered for change monitoring, once, in ascending
+// order ("GetShareNameByPath failed, path=<path>" for an empty path, before any registration;
+// "UpsertVNotifydCfg failed, share=<share>"); IndexMgr::Reindex of every folder in path order
+// ("Reindex failed"). The platform's last error fills "err=[0x<code> <file>:<line>]".
+FILEINDEX_EXPORT bool Updater_hvx60_beta2();
+
 }  // namespace FILEINDEX
 }  // namespace VEXO
 
