@@ -1,9 +1,10 @@
 // fileindex-demo: a walk through the library on the emulated platform, under the build's sandbox
 // root. It sets up an appliance with three shares, starts a stand-in for fileindexd as the
 // "fileindexd" service, and then uses the library as a management program would: paths are
-// resolved, folder settings stored under the folder lock, the folders registered for change
-// monitoring, indexing paused and resumed, a share marked out of space and revived, and events
-// queued. Every command that reaches the stand-in daemon is printed at the end.
+// resolved, folder settings added end to end (folder list, change monitoring, service, daemon
+// commands, events), indexing paused and resumed, a share marked out of space and revived, events
+// queued, a reindex asked for, a share paused and resumed, and a folder removed. Every command that
+// reaches the stand-in daemon is printed at the end.
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/stat.h>
@@ -126,25 +127,12 @@ int main(int, char **argv)
     Show("its share", share + " at " + sharePath);
     Show("/Photo/x (the share database ignores case)", GetFullPath(fullPath, "/Photo/x") ? fullPath : "unresolved");
 
-    Step("Folder settings stored under the folder lock");
-    {
-        Folders folders;
-        const bool locked = folders.Lock(true);
-        Show("locked", locked ? "yes" : "no");
-        if (locked && folders.Load()) {
-            for (const char *request : {R"({"path":"/photo/holiday","name":"Holiday","photo":true})",
-                                        R"({"path":"/video","name":"Films","video":true})",
-                                        R"({"path":"/photo/holiday","document":true})"}) {
-                Json::Value setting;
-                fromString(setting, request);
-                Json::Value report;
-                folders.Upsert(report, setting);
-                Show("upsert " + std::string(request), "change report " + toString(report));
-            }
-            Show("saved", folders.Save() ? "yes" : "no");
-        }
-        folders.Unlock();
-    }
+    Step("Folder settings added end to end: saved, monitored, service and Spotlight on, daemon told, events queued");
+    Json::Value settings;
+    fromString(settings, R"([{"path":"/photo/holiday","name":"Holiday","photo":true},
+                             {"path":"/video","name":"Films","video":true},
+                             {"path":"/photo/holiday","document":true}])");
+    Show("IndexMgr::Upsert", IndexMgr::Upsert(settings) ? "done" : "failed");
     Show("folder.conf", ReadText(FILEINDEX_FOLDER_CONF_PATH));
 
     Step("Lookups and queries");
@@ -182,8 +170,7 @@ int main(int, char **argv)
         close(ready[1]);
     }
 
-    Step("Change monitoring for the photo share");
-    Show("UpsertVNotifydCfg(photo)", IndexMgr::UpsertVNotifydCfg("photo") ? "registered" : "failed");
+    Step("Change monitoring registered by the upsert");
     Show("registrations", ReadText(kState + "/monitor_queues.json"));
 
     Step("Pause, resume, out of space, revive");
@@ -205,6 +192,17 @@ int main(int, char **argv)
     char queue[4096];
     FILEIDXQueuePathGet("photo", queue, sizeof(queue));
     Show("queue", ReadText(queue));
+
+    Step("A reindex, the photo share paused and resumed, the video folder removed");
+    Json::Value paths;
+    paths.append("/photo/holiday");
+    Show("IndexMgr::Reindex([/photo/holiday])", IndexMgr::Reindex(paths) ? "queued" : "failed");
+    Show("IndexMgr::SharePause(photo)", IndexMgr::SharePause("photo") ? "paused" : "failed");
+    Show("IndexMgr::ShareResume(photo)", IndexMgr::ShareResume("photo") ? "resumed" : "failed");
+    Json::Value removed;
+    removed.append("/video");
+    Show("IndexMgr::Delete([/video])", IndexMgr::Delete(removed) ? "removed, video's index data wiped" : "failed");
+    Show("folder.conf", ReadText(FILEINDEX_FOLDER_CONF_PATH));
 
     Step("What reached the platform (journal of the emulation)");
     std::cout << ReadText(kState + "/journal.jsonl");
