@@ -17,6 +17,7 @@
 #include "fileindex/utils.h"
 #include "index_mgr/services.h"
 #include "platform/service.h"
+#include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
 namespace VEXO {
@@ -395,18 +396,19 @@ bool IndexMgr::ShareResume(const std::string &share)
 
 bool IndexMgr::CleanShareIndexData(const std::string &share)
 {
-    char path[kPathSize] = {};
-    if (FILEIDXQueuePathGet(share.c_str(), path, kPathSize) < 0) {
+    std::string queue;
+    if (!GetQueuePath(queue, share)) {
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return false;
     }
-    RemoveTree(path);
-    RemoveTree(QueueCompanionPath(path));
-    if (FILEIDXDBPathGet(share.c_str(), path, kPathSize) < 0) {
+    RemoveTree(queue);
+    RemoveTree(QueueCompanionPath(queue));
+    char database[kPathSize] = {};
+    if (FILEIDXDBPathGet(share.c_str(), database, kPathSize) < 0) {
         FILEIDX_LOG("%s:%d FILEIDXDBPathGet failed, share=%s", share.c_str());
         return false;
     }
-    RemoveTree(path);
+    RemoveTree(database);
     return true;
 }
 
