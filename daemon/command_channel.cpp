@@ -21,25 +21,18 @@ namespace {
 constexpr size_t kMaxWriteSize = 1024;
 constexpr int kEintrAllowance = 3;
 
-// Writes n bytes in pieces of at most 1024. A negative write result is not taken as an error: it
-// is added to the running offset like any other result, stepping back one byte and lengthening
-// what remains, and writing goes on. A zero result is retried only when interrupted, three times.
-// The one limit added is the start of the buffer: stepping back before it would read memory that
-// is not the frame's, so the write fails there instead.
+// Writes n bytes in pieces of at most 1024, each continuing where the last one ended. An
+// interrupted write is tried again, three times in all; any other failed write (the daemon stopped
+// reading for the whole send time-out, or hung up) fails the frame, which the daemon then sees cut
+// short and never damaged.
 bool WriteLoop(int fd, const char *buffer, size_t n)
 {
-    long long offset = 0;
-    long long remaining = static_cast<long long>(n);
+    size_t offset = 0;
     int eintrAllowance = kEintrAllowance;
-    while (remaining > 0) {
-        const size_t piece = std::min(static_cast<size_t>(remaining), kMaxWriteSize);
-        const ssize_t written = write(fd, buffer + offset, piece);
-        if (written != 0) {
-            offset += written;
-            remaining -= written;
-            if (offset < 0) {
-                return false;
-            }
+    while (offset < n) {
+        const ssize_t written = write(fd, buffer + offset, std::min(n - offset, kMaxWriteSize));
+        if (written > 0) {
+            offset += static_cast<size_t>(written);
             continue;
         }
         if (errno == EINTR && eintrAllowance > 0) {
@@ -51,10 +44,17 @@ bool WriteLoop(int fd, const char *buffer, size_t n)
     return true;
 }
 
+// The send time-out is set before connecting: it also bounds the wait of a connection that a
+// daemon, alive but no longer accepting, leaves in its full backlog.
 int ConnectToDaemon()
 {
     const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     if (fd < 0) {
+        return -1;
+    }
+    const timeval sendTimeout = {1, 0};
+    if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &sendTimeout, sizeof(sendTimeout)) != 0) {
+        close(fd);
         return -1;
     }
     sockaddr_un address;
@@ -63,11 +63,6 @@ int ConnectToDaemon()
     static_assert(sizeof(FILEINDEX_DAEMON_SOCKET_PATH) <= sizeof(address.sun_path), "socket path too long");
     memcpy(address.sun_path, FILEINDEX_DAEMON_SOCKET_PATH, sizeof(FILEINDEX_DAEMON_SOCKET_PATH));
     if (connect(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)) != 0) {
-        close(fd);
-        return -1;
-    }
-    const timeval sendTimeout = {1, 0};
-    if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &sendTimeout, sizeof(sendTimeout)) != 0) {
         close(fd);
         return -1;
     }

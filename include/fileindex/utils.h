@@ -135,9 +135,12 @@ FILEINDEX_EXPORT IndexRefusal GetSkipIndexRefusal(const std::string &fullPath);
 
 // Sends {"type": type, "data": data} to fileindexd over "/var/run/fileindexd.sock": one connection,
 // one frame (4-byte length in host byte order counting the terminating NUL, the compact JSON text,
-// the NUL), never answered. True when the whole frame was written. Never waits for a daemon that
-// is not there: no listener is false at once; a stalled one gets 1 s per write. Ignores SIGPIPE
-// process-wide from the first call on. Logs nothing and sets no error code.
+// the NUL), never answered. True when the whole frame was written; the daemon never receives a
+// damaged frame, only a whole one or one cut short. No listener is false at once. Every wait is
+// bounded by a 1 s send time-out: a daemon whose backlog is full, or that stops reading, costs
+// about 1 s and gives false. The worst case is a daemon that keeps reading just slowly enough: 1 s
+// to connect plus 1 s for each 1024-byte piece of the frame (and three interrupted writes).
+// Ignores SIGPIPE process-wide from the first call on. Logs nothing and sets no error code.
 FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string &type, const Json::Value &data);
 
 // Appends {"event": event, "path": path, "data": data} as one line to the event queue of the
