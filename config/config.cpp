@@ -28,15 +28,19 @@ bool Config::Lock(bool exclusive)
 {
     const int operation = (exclusive ? LOCK_EX : LOCK_SH) | LOCK_NB;
     for (int attempts = kLockAttempts; attempts > 0;) {
-        // Each attempt opens the lock file afresh; the descriptor of a failed attempt stays open.
-        m_fdLock = open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644);
+        // The lock file sits in a directory every account may write: a symbolic link planted in its
+        // place is refused, never followed.
+        m_fdLock = open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
         if (m_fdLock < 0) {
             break;
         }
         if (flock(m_fdLock, operation) == 0) {
             return true;
         }
-        if (errno != EINTR && errno != EAGAIN) {
+        const int reason = errno;
+        close(m_fdLock);  // each attempt opens afresh and returns what it opened
+        m_fdLock = -1;
+        if (reason != EINTR && reason != EAGAIN) {
             break;
         }
         usleep(static_cast<useconds_t>((rand() % 10) * 1000));
@@ -54,6 +58,7 @@ void Config::Unlock()
     }
     flock(m_fdLock, LOCK_UN);
     close(m_fdLock);
+    m_fdLock = -1;  // a second Unlock must not close a descriptor that has since reused the number
 }
 
 bool Config::LoadJson()

@@ -9,6 +9,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <ctime>
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -16,6 +17,8 @@ namespace {
 
 // Temporary files are named "<name>.tmp.<pid>.<random>" so that a sweep can tell whose they are.
 const char kTempInfix[] = ".tmp.";
+// No save takes this long: a temporary file this old is an orphan whatever its process number says.
+constexpr time_t kOrphanAge = 3600;
 
 void SplitPath(const std::string &path, std::string &dir, std::string &name)
 {
@@ -29,23 +32,50 @@ void SplitPath(const std::string &path, std::string &dir, std::string &name)
     }
 }
 
-bool WriteAll(int fd, const char *data, size_t size)
+// Writes until all of size is written or a write fails (one writing nothing fails too, as a full
+// disk may answer); returns the bytes written.
+size_t WriteAll(int fd, const char *data, size_t size)
 {
-    while (size > 0) {
-        const ssize_t written = write(fd, data, size);
-        if (written < 0) {
-            if (errno == EINTR) {
-                continue;
-            }
-            return false;
+    size_t done = 0;
+    while (done < size) {
+        const ssize_t written = write(fd, data + done, size - done);
+        if (written < 0 && errno == EINTR) {
+            continue;
         }
-        data += written;
-        size -= static_cast<size_t>(written);
+        if (written <= 0) {
+            break;
+        }
+        done += static_cast<size_t>(written);
     }
-    return true;
+    return done;
 }
 
-// Removes temporary files of name whose writing process no longer exists (killed mid-save).
+void CloseKeepingErrno(int fd)
+{
+    const int reason = errno;
+    close(fd);
+    errno = reason;
+}
+
+// The directory holding path, opened without following a symbolic link at its last component;
+// name receives path's last component.
+int OpenParentDirectory(const std::string &path, std::string &name)
+{
+    std::string dir;
+    SplitPath(path, dir, name);
+    return open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+}
+
+bool IsOrphan(int dirFd, const char *entryName, long pid)
+{
+    if (kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH) {
+        return true;
+    }
+    struct stat st;
+    return fstatat(dirFd, entryName, &st, AT_SYMLINK_NOFOLLOW) == 0 && time(nullptr) - st.st_mtime > kOrphanAge;
+}
+
+// Removes temporary files of name left by savers that were killed mid-save.
 void SweepOrphanedTempFiles(const std::string &dir, const std::string &name)
 {
     DIR *d = opendir(dir.c_str());
@@ -63,7 +93,7 @@ void SweepOrphanedTempFiles(const std::string &dir, const std::string &name)
         if (pid <= 0 || *pidEnd != '.') {
             continue;
         }
-        if (kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH) {
+        if (IsOrphan(dirfd(d), entryName, pid)) {
             unlinkat(dirfd(d), entryName, 0);
         }
     }
@@ -102,9 +132,77 @@ bool ReadWholeFile(const std::string &path, std::string &content)
     }
 }
 
+int OpenRegularFile(const std::string &path, int flags, mode_t mode)
+{
+    std::string name;
+    const int dirFd = OpenParentDirectory(path, name);
+    if (dirFd < 0) {
+        return -1;
+    }
+    // Non-blocking, so that a FIFO in the file's place cannot hold the open up.
+    const int fd = openat(dirFd, name.c_str(), flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, mode);
+    CloseKeepingErrno(dirFd);
+    if (fd < 0) {
+        return -1;
+    }
+    struct stat st;
+    if (fstat(fd, &st) != 0) {
+        CloseKeepingErrno(fd);
+        return -1;
+    }
+    if (!S_ISREG(st.st_mode)) {
+        close(fd);
+        errno = EINVAL;
+        return -1;
+    }
+    return fd;
+}
+
+int MakeDirectory(const std::string &path, mode_t mode)
+{
+    std::string name;
+    const int dirFd = OpenParentDirectory(path, name);
+    if (dirFd < 0) {
+        return -1;
+    }
+    int result = mkdirat(dirFd, name.c_str(), mode);
+    struct stat st;
+    if (result != 0 && errno == EEXIST && fstatat(dirFd, name.c_str(), &st, AT_SYMLINK_NOFOLLOW) == 0) {
+        if (S_ISDIR(st.st_mode)) {
+            result = 0;
+        } else {
+            errno = S_ISLNK(st.st_mode) ? ELOOP : ENOTDIR;
+        }
+    }
+    CloseKeepingErrno(dirFd);
+    return result;
+}
+
+bool AppendLine(int fd, const std::string &line, size_t &written)
+{
+    written = 0;
+    const off_t before = lseek(fd, 0, SEEK_END);
+    if (before < 0) {
+        return false;
+    }
+    char last = '\n';
+    if (before > 0 && pread(fd, &last, 1, before - 1) != 1) {
+        return false;
+    }
+    const std::string text = last == '\n' ? line : "\n" + line;
+    written = WriteAll(fd, text.data(), text.size());
+    if (written == text.size()) {
+        return true;
+    }
+    const int reason = errno;
+    (void)ftruncate(fd, before);  // should this fail too, the next append still starts a new line
+    errno = reason;
+    return false;
+}
+
 bool ForEachLine(const std::string &path, const std::function<bool(const std::string &line)> &visit)
 {
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    const int fd = OpenRegularFile(path, O_RDONLY);
     if (fd < 0) {
         return false;
     }
@@ -151,7 +249,8 @@ bool ReplaceFileAtomically(const std::string &path, const std::string &content)
     if (fd < 0) {
         return false;
     }
-    const bool written = fchmod(fd, 0644) == 0 && WriteAll(fd, content.data(), content.size()) && fsync(fd) == 0;
+    const bool written =
+        fchmod(fd, 0644) == 0 && WriteAll(fd, content.data(), content.size()) == content.size() && fsync(fd) == 0;
     const bool closed = close(fd) == 0;
     if (!written || !closed || rename(tempPath.c_str(), path.c_str()) != 0) {
         unlink(tempPath.c_str());

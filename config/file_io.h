@@ -1,6 +1,8 @@
-// Whole-file reads and atomic replacement. Every descriptor opened here is close-on-exec.
+// Whole-file reads, line files and atomic replacement. Every descriptor opened here is close-on-exec.
 #ifndef FILEINDEX_CONFIG_FILE_IO_H
 #define FILEINDEX_CONFIG_FILE_IO_H
+
+#include <sys/types.h>
 
 #include <functional>
 #include <string>
@@ -11,14 +13,34 @@ namespace FILEINDEX {
 // Reads the whole file into content. False when it cannot be opened or read.
 bool ReadWholeFile(const std::string &path, std::string &content);
 
+// Opens a file in a directory that other users may write (a share's "@eaDir"): a symbolic link in
+// place of the file or of its directory is refused (ELOOP), and so is anything but a regular file,
+// such as a FIFO that would block (EINVAL). flags are open's, O_NOFOLLOW and O_CLOEXEC added.
+// The descriptor, or -1 with errno set.
+int OpenRegularFile(const std::string &path, int flags, mode_t mode = 0);
+
+// Makes the directory path (mode before the umask) inside its parent, refusing a symbolic link in
+// place of either (ELOOP). An existing directory is fine; anything else already there fails with
+// ENOTDIR. 0, or -1 with errno set.
+int MakeDirectory(const std::string &path, mode_t mode);
+
 // Calls visit with each newline-separated line of the file (without its newline; a last line
-// without one included) until visit returns false. False when the file cannot be opened or read.
+// without one included) until visit returns false. The file is opened with OpenRegularFile.
+// False when it cannot be opened or read.
 bool ForEachLine(const std::string &path, const std::function<bool(const std::string &line)> &visit);
+
+// Appends line, which ends in a newline, to the file fd (opened for reading and appending, and
+// locked by the caller) whole or not at all. When the file does not end in a newline (a writer was
+// cut short or killed), one is written first, so that the torn line stays alone. A short write is
+// continued; when the rest cannot be written the file is cut back to its length before the call.
+// written receives the bytes written before a failure (the newline included).
+bool AppendLine(int fd, const std::string &line, size_t &written);
 
 // Writes content to a temporary file beside path (mode 0644), syncs it, renames it over path and
 // syncs the directory, so that a reader without any lock sees either the old or the new content.
-// On any failure the temporary file is removed and path keeps its previous content. Temporary files
-// left behind by killed processes are swept by the next replacement.
+// On any failure the temporary file is removed and path keeps its previous content. Temporary
+// files of earlier savers are swept first: those whose process is gone (killed mid-save) and those
+// older than an hour (their process number may since belong to another program).
 bool ReplaceFileAtomically(const std::string &path, const std::string &content);
 
 }  // namespace FILEINDEX

@@ -27,11 +27,13 @@ constexpr mode_t kQueueFileMode = 0644;
 enum class Append { kWritten, kContended, kFailed };
 
 // Appends one record line under an exclusive flock on the queue, in a single write so that
-// appends of several processes never interleave. Never waits long: three attempts, 0-9 ms apart.
+// appends of several processes never interleave, and whole or not at all (AppendLine). The queue
+// lies in a directory share users may write: a symbolic link at the queue or at "@eaDir" is
+// refused like any file that cannot be opened. Never waits long: three attempts, 0-9 ms apart.
 Append AppendRecord(const std::string &queue, const std::string &line)
 {
     for (int attempt = 1;; ++attempt) {
-        const int fd = open(queue.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, kQueueFileMode);
+        const int fd = OpenRegularFile(queue, O_RDWR | O_CREAT | O_APPEND, kQueueFileMode);
         if (fd < 0) {
             return Append::kFailed;
         }
@@ -50,13 +52,14 @@ Append AppendRecord(const std::string &queue, const std::string &line)
             usleep(static_cast<useconds_t>((rand() % 10) * 1000));
             continue;
         }
-        const ssize_t written = write(fd, line.data(), line.size());
-        if (written < static_cast<ssize_t>(line.size())) {
+        size_t written = 0;
+        const bool appended = AppendLine(fd, line, written);
+        if (!appended) {
             FILEIDX_DEBUG("%s:%d write fail, (%ld, %ld)", static_cast<long>(written), static_cast<long>(line.size()));
         }
         flock(fd, LOCK_UN);
         close(fd);
-        return Append::kWritten;
+        return appended ? Append::kWritten : Append::kFailed;
     }
 }
 

@@ -91,15 +91,15 @@ using VEXO::FILEINDEX::IndexMgr;
 
 int FILEIDXIsPathIndexed(const char *szPath)
 {
-    return IndexMgr::IsPathIndexed(szPath) ? 1 : 0;
+    return szPath != nullptr && IndexMgr::IsPathIndexed(szPath) ? 1 : 0;
 }
 
 int FILEIDXIsFullPathIndexed(const char *szFullPath)
 {
-    return IndexMgr::IsFullPathIndexed(szFullPath) ? 1 : 0;
+    return szFullPath != nullptr && IndexMgr::IsFullPathIndexed(szFullPath) ? 1 : 0;
 }
 
 int FILEIDXIsShareIndexed(const char *szShareName)
 {
-    return IndexMgr::IsShareIndexed(szShareName) ? 1 : 0;
+    return szShareName != nullptr && IndexMgr::IsShareIndexed(szShareName) ? 1 : 0;
 }

@@ -2,13 +2,13 @@
 
 #include <sys/stat.h>
 
-#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <vector>
 
+#include "config/file_io.h"
 #include "config/log.h"
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
@@ -43,8 +43,8 @@ const std::vector<std::string> kExcludedShareNames = {"surveillance", "NetBackup
 
 using ShareRecord = std::unique_ptr<VEXOSHARE, decltype(&VEXOShareFree)>;
 
-// Formats S/@eaDir/<name> of the share into out, making S/@eaDir (through a work buffer of 4096
-// bytes) and, for the database, the final directory on the way. The length written, or -1 when the
+// Formats S/@eaDir/<name> of the share into out (truncated to its size), making S/@eaDir (through
+// a work buffer of 4096 bytes) and, for the database, the final directory on the way. The length written, or -1 when the
 // arguments are invalid or the share is unknown.
 int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *outArgument, const char *name,
                    bool makeFinalDir)
@@ -68,9 +68,12 @@ int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *ou
     if (VEXOEAMKDir(0, metadataDir) < 0) {
         FILEIDX_LOG("%s:%d VEXOEAMKDir failed, path=%s, code=%d", metadataDir, VLIBCErrGet());
     }
-    snprintf(szOut, static_cast<size_t>(cbOutLen), "%s", StoragePath(share->szPath, name).c_str());
-    if (makeFinalDir && mkdir(szOut, 0777) != 0 && errno != EEXIST) {
-        FILEIDX_LOG("%s:%d mkdir failed, path=%s, reason=%m", szOut);
+    const std::string path = StoragePath(share->szPath, name);
+    snprintf(szOut, static_cast<size_t>(cbOutLen), "%s", path.c_str());
+    // The full path is made whatever the caller's buffer holds; a symbolic link at "@eaDir" or at
+    // the directory itself, planted by a share user, is refused rather than followed.
+    if (makeFinalDir && MakeDirectory(path, 0777) != 0) {
+        FILEIDX_LOG("%s:%d mkdir failed, path=%s, reason=%m", path.c_str());
     }
     VEXOShareFree(share);
     return static_cast<int>(strlen(szOut));

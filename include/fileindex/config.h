@@ -30,13 +30,14 @@ public:
     virtual std::string GetPath() const = 0;
 
     // Takes the flock lock on GetLockPath(), exclusive or shared, creating the lock file (mode 0644)
-    // on first use. Never blocks: up to three attempts with a random 0-9 ms sleep between them.
-    // Fails at once when the lock file cannot be opened or flock fails otherwise.
+    // on first use. Never blocks: up to three attempts with a random 0-9 ms sleep between them,
+    // each closing what it opened when it fails. Fails at once when the lock file cannot be opened
+    // (a symbolic link in its place included) or flock fails otherwise.
     // Failure: false, error 9 (FILEIDX_ERR_LOCK), "Failed to lock folder" (for either document);
-    // the last descriptor opened stays open until Unlock.
+    // no descriptor is left open.
     bool Lock(bool exclusive);
-    // Releases the lock and closes its descriptor. Harmless on an object that never locked and
-    // after a failed Lock, whose descriptor it closes.
+    // Releases the lock and closes its descriptor. Does nothing on an object that holds none: one
+    // that never locked, whose Lock failed, or that was already unlocked.
     void Unlock();
 
     // Reads GetPath() into the document. A missing file (or anything but a regular file) is the

@@ -144,11 +144,14 @@ FILEINDEX_EXPORT IndexRefusal GetSkipIndexRefusal(const std::string &fullPath);
 FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string &type, const Json::Value &data);
 
 // Appends {"event": event, "path": path, "data": data} as one line to the event queue of the
-// share holding the full path, under the queue's flock. True also when nothing needed writing (the
-// queue or its ".tmp" companion holds a pending reindex, 65536, of exactly this path) and when
-// another process kept the queue locked through three attempts (the event is then dropped). When
-// the event cannot be written (path outside any share, queue unknown or not openable, flock error)
-// the share ("" when unknown) is marked as needing a reindex instead, and the result is false.
+// share holding the full path, under the queue's flock, whole or not at all: a queue that does not
+// end in a newline (a torn record) gets one first, and an append cut short (disk full, file-size
+// limit) is cut back off. True also when nothing needed writing (the queue or its ".tmp" companion
+// holds a pending reindex, 65536, of exactly this path) and when another process kept the queue
+// locked through three attempts (the event is then dropped). When the event cannot be written
+// (path outside any share, queue unknown, not openable or a symbolic link, "@eaDir" a symbolic
+// link, flock error, append cut short) the share ("" when unknown) is marked as needing a reindex
+// instead, and the result is false.
 // Debug lines at LOG_LEVEL 7 only: "flock fail, ...", "try lock too many times, ...",
 // "write fail, (<written>, <length>)". A queue file it creates gets mode 0644 (less the umask).
 FILEINDEX_EXPORT bool AddCustomEvent(const int &event, const std::string &path, const Json::Value &data);
