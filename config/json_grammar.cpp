@@ -107,9 +107,40 @@ private:
         return Value(depth);
     }
 
-    static bool IsHexDigit(char c)
+    // Reads the four hex digits of a \u escape into unit.
+    bool HexQuad(unsigned &unit)
     {
-        return (c >= '0' && c <= '9') || (c >= 'a' && c <= 'f') || (c >= 'A' && c <= 'F');
+        unit = 0;
+        for (int i = 0; i < 4; ++i) {
+            if (AtEnd()) {
+                return false;
+            }
+            const char c = *m_pos++;
+            const unsigned digit = c >= '0' && c <= '9'   ? static_cast<unsigned>(c - '0')
+                                   : c >= 'a' && c <= 'f' ? static_cast<unsigned>(c - 'a' + 10)
+                                   : c >= 'A' && c <= 'F' ? static_cast<unsigned>(c - 'A' + 10)
+                                                          : 16u;
+            if (digit == 16u) {
+                return false;
+            }
+            unit = unit * 16 + digit;
+        }
+        return true;
+    }
+
+    // A \u escape names one UTF-16 unit: a high surrogate must be followed by an escaped low one,
+    // and a low surrogate never stands alone. The JSON library would otherwise decode an unpaired
+    // one into a wrong character and swallow the text after it.
+    bool UnicodeEscape()
+    {
+        unsigned unit;
+        if (!HexQuad(unit) || (unit >= 0xDC00 && unit <= 0xDFFF)) {
+            return false;
+        }
+        if (unit < 0xD800 || unit > 0xDBFF) {
+            return true;
+        }
+        return Take('\\') && Take('u') && HexQuad(unit) && unit >= 0xDC00 && unit <= 0xDFFF;
     }
 
     bool String()
@@ -140,12 +171,7 @@ private:
         case '"': case '\\': case '/': case 'b': case 'f': case 'n': case 'r': case 't':
             return true;
         case 'u':
-            for (int i = 0; i < 4; ++i) {
-                if (AtEnd() || !IsHexDigit(*m_pos++)) {
-                    return false;
-                }
-            }
-            return true;
+            return UnicodeEscape();
         default:
             return false;
         }

@@ -1,5 +1,6 @@
 // Checks text against the JSON grammar of RFC 8259 before it is handed to the JSON library, which
-// on its own also accepts "01", "1.", a lone "-" and raw control characters inside strings.
+// on its own also accepts "01", "1.", a lone "-", raw control characters inside strings and
+// unpaired UTF-16 surrogate escapes ("\ud800\u0041" would lose its "A").
 #ifndef FILEINDEX_CONFIG_JSON_GRAMMAR_H
 #define FILEINDEX_CONFIG_JSON_GRAMMAR_H
 

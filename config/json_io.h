@@ -1,7 +1,7 @@
 // Whole-document operations on Json::Value, used for every file, frame, record and log argument.
 //
 // Reading is strict JSON text (RFC 8259): any value at the top level, no comments, nothing but
-// white space after the value. Bytes inside strings are kept as they are, valid UTF-8 or not.
+// white space after the value, surrogate escapes only in pairs. Bytes inside strings are kept as they are, valid UTF-8 or not.
 // Writing is compact, on one line, with string bytes copied raw, so a value read back from what
 // toString wrote equals the original byte for byte.
 #ifndef FILEINDEX_CONFIG_JSON_IO_H

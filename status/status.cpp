@@ -4,6 +4,7 @@
 
 #include "appliance_paths.h"
 #include "config/log.h"
+#include "fileindex/error.h"
 #include "fileindex/utils.h"
 
 namespace VEXO {
@@ -30,6 +31,26 @@ bool SetShareMark(Json::Value &document, const char *key, const std::string &sha
     return added;
 }
 
+// The layout every operation below can read and change without the JSON library throwing: an
+// object whose share marks are objects (or null, as clearing an absent mark leaves them), whose
+// "resume_time" is a 64-bit integer, and whose other members, the updated marks, read as booleans.
+bool IsStatusLayout(const Json::Value &document)
+{
+    if (!document.isObject()) {
+        return false;
+    }
+    for (auto member = document.begin(); member != document.end(); ++member) {
+        const std::string key = member.name();
+        const bool readable = key == kNoSpace || key == kNeedReindex ? member->isObject() || member->isNull()
+                              : key == kResumeTime                  ? member->isInt64()
+                                                                    : member->isConvertibleTo(Json::booleanValue);
+        if (!readable) {
+            return false;
+        }
+    }
+    return true;
+}
+
 bool HasShareMark(const Json::Value &document, const char *key, const std::string &share)
 {
     const Json::Value &marks = document[key];
@@ -50,7 +71,16 @@ std::string Status::GetLockPath() const
 
 bool Status::Load()
 {
-    return LoadJson();
+    if (!LoadJson()) {
+        return false;
+    }
+    // A document of another shape is refused like an unparsable one, before any operation trips on it.
+    if (!IsStatusLayout(m_jsConfig)) {
+        FILEIDX_LOG("%s:%d Failed to load json from %s", GetPath().c_str());
+        ErrorHandler::SetError(FILEIDX_ERR_LOAD_CONFIG);
+        return false;
+    }
+    return true;
 }
 
 bool Status::Save()

@@ -15,15 +15,17 @@
 namespace VEXO {
 namespace FILEINDEX {
 
-// The status document in memory. Its operations neither lock, load nor save; they throw the JSON
-// library's Json::LogicError when the loaded document has the wrong shape (for example a top level
-// that is not an object), except GetPauseInfo, which catches it.
+// The status document in memory. Its operations neither lock, load nor save.
 class FILEINDEX_EXPORT Status : public Config {
 public:
     // "/usr/vexo/etc/fileindex/status.conf" and "/tmp/fileidx_cfg_status.lock".
     std::string GetPath() const override;
     std::string GetLockPath() const override;
-    // Config::LoadJson and Config::SaveJson: the document as the file holds it, its shape unchecked.
+    // Config::LoadJson, then the layout above is checked: a top level that is not an object,
+    // "no_space" or "need_reindex" neither an object nor null, a "resume_time" that is not a
+    // 64-bit integer, or an updated mark that does not read as a boolean (a string, an array, an
+    // object) is refused like an unreadable file: false, error 6 (FILEIDX_ERR_LOAD_CONFIG),
+    // "Failed to load json from <path>". Save is Config::SaveJson.
     bool Load() override;
     bool Save() override;
 
@@ -55,7 +57,7 @@ public:
 // attempts), loads, changes, saves, sends its daemon command while still holding the lock, and
 // unlocks on every path. A failed send logs "SendCammandToDaemon failed" and answers false; the
 // saved change stays. Reading operations load without the lock and answer false when status.conf
-// cannot be read.
+// cannot be read or has the wrong layout (see Status::Load); no operation throws.
 class FILEINDEX_EXPORT StatusMgr {
 public:
     static bool SetUpdated(const std::string &name);
