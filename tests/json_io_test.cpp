@@ -25,6 +25,9 @@ TEST(JsonText, ReadsExactlyOneStrictJsonValue)
         {"01", false}, {"1.", false}, {"-", false}, {".5", false}, {"1e", false}, {"+1", false},
         // Strings: raw control characters, unknown or short escapes, no end.
         {"\"raw\x01" "control\"", false}, {"\"bad \\x escape\"", false}, {"\"\\u12\"", false},
+        // Surrogate escapes only in pairs: an unpaired one would be decoded into a wrong character.
+        {"\"\\ud83d\\ude00\"", true}, {"\"\\ud800\\u0041\"", false}, {"\"\\ud800\"", false}, {"\"\\udc00\"", false},
+        {"\"\\ud800\\ud800\"", false},
         {"\"unterminated", false},
         {std::string(100000, '[') + std::string(100000, ']'), false},  // too deep: refused, not recursed into
     };

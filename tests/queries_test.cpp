@@ -71,6 +71,9 @@ TEST_F(QueriesTest, QueriesReadTheFolderListAfreshAtEveryCall)
     EXPECT_EQ(FILEIDXIsPathIndexed("/photo/b"), 0);
     EXPECT_EQ(FILEIDXIsFullPathIndexed(HostPath("/volume1/photo/a/x").c_str()), 1);
     EXPECT_EQ(FILEIDXIsFullPathIndexed(HostPath("/volume1/photo").c_str()), 0);
+    EXPECT_EQ(FILEIDXIsPathIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsFullPathIndexed(nullptr), 0);
+    EXPECT_EQ(FILEIDXIsShareIndexed(nullptr), 0);
 }
 
 TEST_F(QueriesTest, ShareIsIndexedByExactNameAndUnnamedFoldersArePassedOver)

@@ -76,6 +76,8 @@ TEST_F(ShareStorageTest, PathsLieInTheSharesMetadataDirectoryWhichIsMade)
     } cases[] = {
         {true, "PHOTO", 4096, queue, false},  // the share's stored path, whatever the case asked for
         {true, "photo", 12, queue, false},    // cut to the buffer, terminated
+        // cut within the directory's name: the directory is still made in full, nothing under the cut name
+        {false, "photo", static_cast<int>(MetadataDirPath(SharePath("photo")).size()) + 6, database, true},
         {false, "photo", 4096, database, true},
         {false, "photo", 4096, database, true},  // made already: quietly again
     };
@@ -90,6 +92,7 @@ TEST_F(ShareStorageTest, PathsLieInTheSharesMetadataDirectoryWhichIsMade)
         EXPECT_EQ(length, static_cast<int>(expected.size()));
         EXPECT_TRUE(stdfs::is_directory(MetadataDirPath(SharePath("photo"))));
         EXPECT_EQ(stdfs::is_directory(c.path), c.madeDir);
+        EXPECT_TRUE(c.isQueue || expected == c.path || !stdfs::exists(expected));
         EXPECT_FALSE(stdfs::exists(queue)) << "the queue file is made by its first writer";
     }
     EXPECT_TRUE(LogCapture::Lines().empty());

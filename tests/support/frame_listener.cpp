@@ -16,15 +16,37 @@
 
 namespace fileindex_test {
 
-FrameListener::FrameListener(Mode mode) : m_mode(mode), m_listenFd(-1), m_stopPipe{-1, -1}
+namespace {
+
+sockaddr_un DaemonAddress()
 {
-    unlink(FILEINDEX_DAEMON_SOCKET_PATH);
-    m_listenFd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     sockaddr_un address = {};
     address.sun_family = AF_UNIX;
     strcpy(address.sun_path, FILEINDEX_DAEMON_SOCKET_PATH);
-    EXPECT_EQ(bind(m_listenFd, reinterpret_cast<sockaddr *>(&address), sizeof(address)), 0) << strerror(errno);
-    EXPECT_EQ(listen(m_listenFd, 16), 0);
+    return address;
+}
+
+int ConnectToListener()
+{
+    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const sockaddr_un address = DaemonAddress();
+    EXPECT_EQ(connect(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)), 0) << strerror(errno);
+    return fd;
+}
+
+}  // namespace
+
+FrameListener::FrameListener(Mode mode)
+    : m_mode(mode), m_listenFd(-1), m_fillerFd(-1), m_stopPipe{-1, -1}
+{
+    unlink(FILEINDEX_DAEMON_SOCKET_PATH);
+    m_listenFd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const sockaddr_un address = DaemonAddress();
+    EXPECT_EQ(bind(m_listenFd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)), 0) << strerror(errno);
+    EXPECT_EQ(listen(m_listenFd, mode == Mode::kBacklogFull ? 0 : 16), 0);
+    if (mode == Mode::kBacklogFull) {
+        m_fillerFd = ConnectToListener();
+    }
     EXPECT_EQ(pipe2(m_stopPipe, O_CLOEXEC), 0);
     m_thread = std::thread(&FrameListener::Run, this);
 }
@@ -34,13 +56,25 @@ FrameListener::~FrameListener()
     (void)write(m_stopPipe[1], "x", 1);
     m_thread.join();
     close(m_listenFd);
+    if (m_fillerFd >= 0) {
+        close(m_fillerFd);
+    }
     close(m_stopPipe[0]);
     close(m_stopPipe[1]);
     unlink(FILEINDEX_DAEMON_SOCKET_PATH);
 }
 
+bool FrameListener::WaitForStop(int milliseconds)
+{
+    pollfd stop = {m_stopPipe[0], POLLIN, 0};
+    return poll(&stop, 1, milliseconds) > 0;
+}
+
 void FrameListener::Run()
 {
+    if (m_mode == Mode::kBacklogFull && WaitForStop(5000)) {
+        return;
+    }
     for (;;) {
         pollfd fds[2] = {{m_listenFd, POLLIN, 0}, {m_stopPipe[0], POLLIN, 0}};
         if (poll(fds, 2, -1) < 0 || (fds[1].revents & POLLIN) != 0) {
@@ -50,8 +84,12 @@ void FrameListener::Run()
         if (connection < 0) {
             continue;
         }
+        if (m_mode == Mode::kStallThenRead && WaitForStop(2500)) {
+            close(connection);
+            return;
+        }
         std::string bytes;
-        if (m_mode == Mode::kReadAll) {
+        if (m_mode == Mode::kReadAll || m_mode == Mode::kStallThenRead) {
             char buffer[4096];
             ssize_t got;
             while ((got = read(connection, buffer, sizeof(buffer))) > 0) {

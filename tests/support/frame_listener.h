@@ -16,6 +16,10 @@ public:
     enum class Mode {
         kReadAll,        // read until the sender closes
         kCloseAtOnce,    // close without reading anything
+        kStallThenRead,  // let each connection wait 2.5 s, past any sender's time-out, then read it
+        kBacklogFull,    // a backlog of one that the listener fills itself; nothing is accepted for
+                         // 5 s, after which waiting connections are closed, so that a sender that
+                         // would wait for ever fails its test instead of hanging it
     };
 
     // Listens on the daemon socket path.
@@ -30,9 +34,11 @@ public:
 
 private:
     void Run();
+    bool WaitForStop(int milliseconds);
 
     const Mode m_mode;
     int m_listenFd;
+    int m_fillerFd;
     int m_stopPipe[2];
     std::mutex m_mutex;
     std::condition_variable m_changed;

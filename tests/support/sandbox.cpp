@@ -1,6 +1,9 @@
 #include "tests/support/sandbox.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <fstream>
 #include <sstream>
@@ -38,6 +41,16 @@ Json::Value ParseJson(const std::string &text)
     Json::Value value;
     EXPECT_TRUE(VEXO::FILEINDEX::fromString(value, text)) << text;
     return value;
+}
+
+bool IsLockHeld(const std::string &lockPath)
+{
+    const int fd = open(lockPath.c_str(), O_RDWR | O_CLOEXEC);
+    const bool held = fd >= 0 && flock(fd, LOCK_EX | LOCK_NB) != 0;
+    if (fd >= 0) {
+        close(fd);
+    }
+    return held;
 }
 
 void SandboxTest::SetUp()

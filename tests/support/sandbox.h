@@ -48,6 +48,8 @@ private:
 std::string ReadFile(const std::string &path);
 void WriteFile(const std::string &path, const std::string &content);
 Json::Value ParseJson(const std::string &text);  // fails the test on anything but strict JSON text
+// True when some descriptor holds a flock on the lock file (its own attempt to lock fails).
+bool IsLockHeld(const std::string &lockPath);
 
 }  // namespace fileindex_test
 

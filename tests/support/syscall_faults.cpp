@@ -1,6 +1,9 @@
 #include "tests/support/syscall_faults.h"
 
+#include <dirent.h>
 #include <dlfcn.h>
+#include <fcntl.h>
+#include <stdarg.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -12,24 +15,65 @@
 namespace fileindex_test {
 namespace {
 
+constexpr int kKinds = static_cast<int>(Syscall::kCount);
+
 struct Armed {
     std::atomic<int> errnoValue{0};
     std::atomic<int> hits{0};
+    int skip = -1;  // -1: every call fails; otherwise the calls in scope that pass before one fails
+    int seen = 0;
 };
 
-Armed g_faults[3];
+Armed g_faults[kKinds];
+std::atomic<int> g_armed{0};  // faults and traces armed; calls are looked at only while non-zero
+std::string g_scope;
+std::mutex g_traceMutex;
+bool g_tracing = false;
+std::vector<Syscall> g_trace;
 
 Armed &FaultOf(Syscall call)
 {
     return g_faults[static_cast<int>(call)];
 }
 
-// True (errno set) when the call is to fail.
-bool Fires(Syscall call)
+std::string PathOfFd(int fd)
 {
+    char link[64];
+    char target[4096];
+    snprintf(link, sizeof(link), "/proc/self/fd/%d", fd);
+    const ssize_t length = readlink(link, target, sizeof(target));
+    return length > 0 ? std::string(target, static_cast<size_t>(length)) : std::string();
+}
+
+std::string PathAt(int dirFd, const char *name)
+{
+    return name[0] == '/' || dirFd == AT_FDCWD ? name : PathOfFd(dirFd) + "/" + name;
+}
+
+// True (errno set) when the call is to fail. where() names the file the call is about.
+template <typename Where>
+bool Fires(Syscall call, const Where &where)
+{
+    if (g_armed.load() == 0) {
+        return false;
+    }
     Armed &armed = FaultOf(call);
     const int value = armed.errnoValue.load();
-    if (value == 0) {
+    const bool tracing = [] {
+        std::lock_guard<std::mutex> lock(g_traceMutex);
+        return g_tracing;
+    }();
+    bool inScope = false;
+    if (tracing || (value != 0 && armed.skip >= 0)) {
+        const std::string path = where();
+        inScope = path == g_scope || path.rfind(g_scope + "/", 0) == 0;
+    }
+    if (tracing && inScope) {
+        std::lock_guard<std::mutex> lock(g_traceMutex);
+        g_trace.push_back(call);
+    }
+    const bool repeats = value == SyscallFault::kNothingWritten && armed.hits < 1000;
+    if (value == 0 || (armed.skip >= 0 && (!inScope || (armed.seen++ != armed.skip && !repeats)))) {
         return false;
     }
     ++armed.hits;
@@ -66,20 +110,57 @@ Function Next(const char *name)
 
 }  // namespace
 
-SyscallFault::SyscallFault(Syscall call, int errnoValue) : m_call(call)
+const char *SyscallName(Syscall call)
 {
-    FaultOf(call).hits = 0;
-    FaultOf(call).errnoValue = errnoValue;
+    static const char *const kNames[kKinds] = {"chmod", "close", "fchmod", "flock", "fstat",  "fsync",  "ftruncate", "lseek",
+                                               "mkostemp", "open", "openat", "pread", "read", "rename", "write"};
+    return kNames[static_cast<int>(call)];
+}
+
+SyscallFault::SyscallFault(Syscall call, int errnoValue) : SyscallFault(call, errnoValue, std::string(), -1) {}
+
+SyscallFault::SyscallFault(Syscall call, int errnoValue, const std::string &scope, int skip) : m_call(call)
+{
+    Armed &armed = FaultOf(call);
+    armed.hits = 0;
+    armed.seen = 0;
+    armed.skip = skip;
+    g_scope = scope;
+    armed.errnoValue = errnoValue;
+    ++g_armed;
 }
 
 SyscallFault::~SyscallFault()
 {
     FaultOf(m_call).errnoValue = 0;
+    --g_armed;
 }
 
 int SyscallFault::Hits() const
 {
     return FaultOf(m_call).hits.load();
+}
+
+SyscallTrace::SyscallTrace(const std::string &scope)
+{
+    std::lock_guard<std::mutex> lock(g_traceMutex);
+    g_scope = scope;
+    g_trace.clear();
+    g_tracing = true;
+    ++g_armed;
+}
+
+SyscallTrace::~SyscallTrace()
+{
+    std::lock_guard<std::mutex> lock(g_traceMutex);
+    g_tracing = false;
+    --g_armed;
+}
+
+std::vector<Syscall> SyscallTrace::Calls() const
+{
+    std::lock_guard<std::mutex> lock(g_traceMutex);
+    return g_trace;
 }
 
 SocketWriteRecorder::SocketWriteRecorder(std::function<void()> onWrite)
@@ -103,44 +184,169 @@ std::vector<size_t> SocketWriteRecorder::Sizes() const
     return g_socketWrites;
 }
 
+size_t OpenDescriptorCount()
+{
+    size_t count = 0;
+    DIR *dir = opendir("/proc/self/fd");
+    while (dir != nullptr && readdir(dir) != nullptr) {
+        ++count;
+    }
+    closedir(dir);
+    return count - 3;  // ".", ".." and the directory's own descriptor
+}
+
 }  // namespace fileindex_test
 
+using fileindex_test::Fires;
+using fileindex_test::Next;
+using fileindex_test::PathAt;
+using fileindex_test::PathOfFd;
 using fileindex_test::Syscall;
+
+// The interposed calls: each fails when its fault fires, and otherwise goes on to the C library.
+#define FILEINDEX_PASS_ON(name, Signature, ...)                  \
+    static const auto next = Next<Signature>(name);              \
+    return next(__VA_ARGS__)
 
 extern "C" {
 
 int chmod(const char *path, mode_t mode)
 {
-    if (fileindex_test::Fires(Syscall::kChmod)) {
+    if (Fires(Syscall::kChmod, [&] { return std::string(path); })) {
         return -1;
     }
-    static const auto next = fileindex_test::Next<int (*)(const char *, mode_t)>("chmod");
-    return next(path, mode);
+    FILEINDEX_PASS_ON("chmod", int (*)(const char *, mode_t), path, mode);
+}
+
+int close(int fd)
+{
+    static const auto next = Next<int (*)(int)>("close");
+    if (Fires(Syscall::kClose, [&] { return PathOfFd(fd); })) {
+        const int reason = errno;
+        next(fd);
+        errno = reason;
+        return -1;
+    }
+    return next(fd);
+}
+
+int fchmod(int fd, mode_t mode)
+{
+    if (Fires(Syscall::kFchmod, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("fchmod", int (*)(int, mode_t), fd, mode);
+}
+
+int flock(int fd, int operation)
+{
+    if (Fires(Syscall::kFlock, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("flock", int (*)(int, int), fd, operation);
+}
+
+int fstat(int fd, struct stat *st)
+{
+    if (Fires(Syscall::kFstat, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("fstat", int (*)(int, struct stat *), fd, st);
 }
 
 int fsync(int fd)
 {
-    if (fileindex_test::Fires(Syscall::kFsync)) {
+    if (Fires(Syscall::kFsync, [&] { return PathOfFd(fd); })) {
         return -1;
     }
-    static const auto next = fileindex_test::Next<int (*)(int)>("fsync");
-    return next(fd);
+    FILEINDEX_PASS_ON("fsync", int (*)(int), fd);
+}
+
+int ftruncate(int fd, off_t length)
+{
+    if (Fires(Syscall::kFtruncate, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("ftruncate", int (*)(int, off_t), fd, length);
+}
+
+off_t lseek(int fd, off_t offset, int whence)
+{
+    if (Fires(Syscall::kLseek, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("lseek", off_t (*)(int, off_t, int), fd, offset, whence);
+}
+
+int mkostemp(char *pathTemplate, int flags)
+{
+    if (Fires(Syscall::kMkostemp, [&] { return std::string(pathTemplate); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("mkostemp", int (*)(char *, int), pathTemplate, flags);
+}
+
+int open(const char *path, int flags, ...)
+{
+    mode_t mode = 0;
+    if ((flags & (O_CREAT | O_TMPFILE)) != 0) {
+        va_list args;
+        va_start(args, flags);
+        mode = static_cast<mode_t>(va_arg(args, int));
+        va_end(args);
+    }
+    if (Fires(Syscall::kOpen, [&] { return std::string(path); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("open", int (*)(const char *, int, ...), path, flags, mode);
+}
+
+int openat(int dirFd, const char *path, int flags, ...)
+{
+    mode_t mode = 0;
+    if ((flags & (O_CREAT | O_TMPFILE)) != 0) {
+        va_list args;
+        va_start(args, flags);
+        mode = static_cast<mode_t>(va_arg(args, int));
+        va_end(args);
+    }
+    if (Fires(Syscall::kOpenat, [&] { return PathAt(dirFd, path); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("openat", int (*)(int, const char *, int, ...), dirFd, path, flags, mode);
+}
+
+ssize_t pread(int fd, void *buffer, size_t size, off_t offset)
+{
+    if (Fires(Syscall::kPread, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("pread", ssize_t (*)(int, void *, size_t, off_t), fd, buffer, size, offset);
+}
+
+ssize_t read(int fd, void *buffer, size_t size)
+{
+    if (Fires(Syscall::kRead, [&] { return PathOfFd(fd); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("read", ssize_t (*)(int, void *, size_t), fd, buffer, size);
+}
+
+int rename(const char *from, const char *to)
+{
+    if (Fires(Syscall::kRename, [&] { return std::string(from); })) {
+        return -1;
+    }
+    FILEINDEX_PASS_ON("rename", int (*)(const char *, const char *), from, to);
 }
 
 ssize_t write(int fd, const void *buffer, size_t size)
 {
     fileindex_test::RecordIfSocket(fd, size);
-    static const auto next = fileindex_test::Next<ssize_t (*)(int, const void *, size_t)>("write");
-    return next(fd, buffer, size);
-}
-
-int rename(const char *from, const char *to)
-{
-    if (fileindex_test::Fires(Syscall::kRename)) {
-        return -1;
+    if (Fires(Syscall::kWrite, [&] { return PathOfFd(fd); })) {
+        return errno == fileindex_test::SyscallFault::kNothingWritten ? 0 : -1;
     }
-    static const auto next = fileindex_test::Next<int (*)(const char *, const char *)>("rename");
-    return next(from, to);
+    FILEINDEX_PASS_ON("write", ssize_t (*)(int, const void *, size_t), fd, buffer, size);
 }
 
 }

@@ -6,16 +6,28 @@
 
 #include <cstddef>
 #include <functional>
+#include <string>
 #include <vector>
 
 namespace fileindex_test {
 
-enum class Syscall { kChmod, kFsync, kRename };
+enum class Syscall {
+    kChmod, kClose, kFchmod, kFlock, kFstat, kFsync, kFtruncate, kLseek, kMkostemp, kOpen, kOpenat, kPread,
+    kRead, kRename, kWrite, kCount
+};
+const char *SyscallName(Syscall call);
 
-// While the guard exists, every call of the given kind fails with errnoValue.
+// Fails calls of one kind with errnoValue until the guard's end. The first form fails every call;
+// the second only calls on the directory scope or on files under it, and of those only the one
+// after the first skip. A failed close still closes the descriptor, as the system does.
 class SyscallFault {
 public:
+    // In place of an errno: the write returns 0, as a full device may, and keeps doing so for
+    // the calls after it too (a thousand at most, so that a writer that retries for ever ends).
+    static constexpr int kNothingWritten = -1;
+
     SyscallFault(Syscall call, int errnoValue);
+    SyscallFault(Syscall call, int errnoValue, const std::string &scope, int skip);
     ~SyscallFault();
     SyscallFault(const SyscallFault &) = delete;
     SyscallFault &operator=(const SyscallFault &) = delete;
@@ -25,6 +37,18 @@ public:
 
 private:
     Syscall m_call;
+};
+
+// Records the kinds of the calls made on the directory scope or on files under it while it
+// exists, in order.
+class SyscallTrace {
+public:
+    explicit SyscallTrace(const std::string &scope);
+    ~SyscallTrace();
+    SyscallTrace(const SyscallTrace &) = delete;
+    SyscallTrace &operator=(const SyscallTrace &) = delete;
+
+    std::vector<Syscall> Calls() const;
 };
 
 // Records the size of every write() to a socket made while it exists, in order, and runs onWrite
@@ -38,6 +62,9 @@ public:
 
     std::vector<size_t> Sizes() const;
 };
+
+// The number of descriptors this process has open.
+size_t OpenDescriptorCount();
 
 }  // namespace fileindex_test
 

@@ -1,0 +1,310 @@
+// What other users of the appliance, a stalled daemon or a damaged file can do to a caller: no
+// hang, no damaged frame, no write through a planted link, no lost descriptor, no exception.
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/time.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstring>
+#include <functional>
+
+#include "daemon/queue_record.h"
+#include "fileindex/error.h"
+#include "fileindex/fileidx.h"
+#include "fileindex/folder.h"
+#include "fileindex/status.h"
+#include "fileindex/utils.h"
+#include "share/storage_paths.h"
+#include "tests/support/child.h"
+#include "tests/support/frame_listener.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/sandbox.h"
+#include "tests/support/syscall_faults.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace fileindex_test {
+namespace {
+
+const std::string kStatusConf = FILEINDEX_STATUS_CONF_PATH;
+const std::string kStatusLock = FILEINDEX_STATUS_LOCK_PATH;
+
+class HardeningTest : public SandboxTest {
+protected:
+    void SetUp() override
+    {
+        SandboxTest::SetUp();
+        DeclareShares("volume1/photo");
+        m_metadataDir = MetadataDirPath(SharePath("photo"));
+        stdfs::create_directories(m_metadataDir);
+        m_queue = StoragePath(SharePath("photo"), kQueueFileName);
+        m_folder = SharePath("photo") + "/holiday";
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+    }
+
+    // The queue line of a folder-setting event for m_folder whose data is {"seq": seq}.
+    std::string Record(int seq) const
+    {
+        return "{\"data\":{\"seq\":" + std::to_string(seq) + "},\"event\":131072,\"path\":\"" + m_folder + "\"}\n";
+    }
+    bool AddEvent(int seq) const
+    {
+        Json::Value data;
+        data["seq"] = seq;
+        return AddCustomEvent(kEventFolderSettingChanged, m_folder, data);
+    }
+
+    std::string m_metadataDir;
+    std::string m_queue;
+    std::string m_folder;
+};
+
+// A daemon that is alive but stuck must cost a status writer about a second, leave the status lock
+// free, and never receive a frame with bytes repeated or skipped: the whole frame or a cut one.
+TEST_F(HardeningTest, StuckDaemonCostsAboutASecondAndGetsNoDamagedFrame)
+{
+    const struct {
+        FrameListener::Mode mode;
+        size_t shareNameLength;  // the frame must outgrow the socket buffer for the stall to bite
+    } cases[] = {
+        {FrameListener::Mode::kBacklogFull, 5},
+        {FrameListener::Mode::kStallThenRead, 1 << 20},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(static_cast<int>(c.mode));
+        FrameListener daemon(c.mode);
+        LogCapture::Clear();
+        const std::string share(c.shareNameLength, 's');
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_FALSE(StatusMgr::ShareRevive(share));
+        EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(2000));
+        EXPECT_FALSE(IsLockHeld(kStatusLock));
+        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"SendCammandToDaemon failed"});
+        if (c.mode == FrameListener::Mode::kStallThenRead) {
+            const std::string text = "{\"data\":{\"share_name\":\"" + share + "\"},\"type\":\"revive_share_worker\"}";
+            const uint32_t length = static_cast<uint32_t>(text.size() + 1);
+            const std::string frame = std::string(reinterpret_cast<const char *>(&length), 4) + text + '\0';
+            const std::string received = daemon.Connections(1).at(0);
+            EXPECT_LT(received.size(), frame.size());
+            EXPECT_TRUE(frame.compare(0, received.size(), received) == 0) << "the daemon received a damaged frame";
+        }
+    }
+}
+
+// A share user, or any account in /tmp, plants a symbolic link where the library writes. Whatever
+// it points at stays as it was, nothing is created, and the caller gets an ordinary failure.
+TEST_F(HardeningTest, PlantedLinksAreNeverWrittenThrough)
+{
+    const std::string victim = HostPath("/victim");
+    const std::string victimDir = HostPath("/victimdir");
+    const std::string missing = HostPath("/missing");
+    const std::string database = StoragePath(SharePath("photo"), kDatabaseDirName);
+    WriteFile(victim, "victim\n");
+    stdfs::create_directories(victimDir);
+    char buffer[4096];
+    const std::function<bool()> addEvent = [&] { return AddEvent(1); };
+    const std::function<bool()> databasePath = [&] { return FILEIDXDBPathGet("photo", buffer, sizeof(buffer)) > 0; };
+    const std::function<bool()> statusChange = [] { return StatusMgr::SetUpdated("x"); };
+    const std::function<bool()> folderLock = [] {
+        Folders folders;
+        const bool locked = folders.Lock(true);
+        folders.Unlock();
+        return locked;
+    };
+    const struct {
+        std::string link;
+        const std::string &target;
+        const std::function<bool()> &call;
+        bool result;
+    } cases[] = {
+        {m_queue, victim, addEvent, false},
+        {m_queue, missing, addEvent, false},
+        {QueueCompanionPath(m_queue), victim, addEvent, true},
+        {m_metadataDir, victimDir, addEvent, false},
+        {m_metadataDir, victimDir, databasePath, true},
+        {database, missing, databasePath, true},
+        {kStatusLock, missing, statusChange, false},
+        {FILEINDEX_FOLDER_LOCK_PATH, victim, folderLock, false},
+        {FILEINDEX_FOLDER_LOCK_PATH, missing, folderLock, false},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.link + " -> " + c.target);
+        stdfs::remove_all(c.link);
+        ASSERT_EQ(symlink(c.target.c_str(), c.link.c_str()), 0);
+        const size_t descriptors = OpenDescriptorCount();
+        EXPECT_EQ(c.call(), c.result);
+        EXPECT_EQ(OpenDescriptorCount(), descriptors);
+        EXPECT_EQ(ReadFile(victim), "victim\n");
+        EXPECT_FALSE(stdfs::exists(missing));
+        EXPECT_TRUE(stdfs::is_empty(victimDir));
+        stdfs::remove(c.link);
+        stdfs::create_directories(m_metadataDir);
+    }
+}
+
+// Every operation returns the descriptors it opened, on success and on each failure it can meet:
+// a busy process would otherwise run out of them and fail every lock.
+TEST_F(HardeningTest, DescriptorsAreReturnedOnEveryPath)
+{
+    FrameListener daemon;
+    LockHolder folderWriter(FILEINDEX_FOLDER_LOCK_PATH, true);
+    char buffer[4096];
+    const struct {
+        const char *name;
+        std::function<void()> run;
+    } cases[] = {
+        {"lock met by another holder", [] {
+             Folders folders;
+             EXPECT_FALSE(folders.Lock(true));
+             folders.Unlock();
+         }},
+        {"lock, unlock twice", [] {
+             Status status;
+             EXPECT_TRUE(status.Lock(true));
+             status.Unlock();
+             status.Unlock();
+         }},
+        {"command saved and sent", [&] {
+             EXPECT_TRUE(StatusMgr::Resume());
+             daemon.Connections(1);
+         }},
+        {"unreadable status file", [] {
+             WriteFile(kStatusConf, "{");
+             EXPECT_FALSE(StatusMgr::SetUpdated("x"));
+             stdfs::remove(kStatusConf);
+         }},
+        {"event appended", [&] { EXPECT_TRUE(AddEvent(1)); }},
+        {"event met by a busy queue", [&] {
+             LockHolder appender(m_queue, true);
+             EXPECT_TRUE(AddEvent(2));
+         }},
+        {"event whose queue cannot be opened", [&] {
+             stdfs::remove(m_queue);
+             stdfs::create_directories(m_queue);
+             EXPECT_FALSE(AddEvent(3));
+             stdfs::remove(m_queue);
+         }},
+        {"database path", [&] { EXPECT_GT(FILEIDXDBPathGet("photo", buffer, sizeof(buffer)), 0); }},
+    };
+    for (const auto &c : cases) {
+        const size_t before = OpenDescriptorCount();
+        c.run();
+        EXPECT_EQ(OpenDescriptorCount(), before) << c.name;
+    }
+}
+
+// An append cut short (disk full, file-size limit) or a writer killed mid-append must not make the
+// next record unreadable: each record ends up whole on its own line, or not in the queue at all.
+TEST_F(HardeningTest, CutAppendNeverSpoilsTheNextRecord)
+{
+    const struct {
+        std::string before;
+        bool cutByTheSizeLimit;  // else the queue already ends in a torn record
+        std::string after;
+    } cases[] = {
+        {Record(0), true, Record(0) + Record(2)},
+        {Record(0) + "{\"data\":{\"seq\":1},\"ev", false, Record(0) + "{\"data\":{\"seq\":1},\"ev\n" + Record(2)},
+    };
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.after);
+        WriteFile(m_queue, c.before);
+        stdfs::remove(kStatusConf);
+        if (c.cutByTheSizeLimit) {
+            const rlim_t limitBytes = c.before.size() + 20;
+            Child cut([&](const Child::Ready &) {
+                signal(SIGXFSZ, SIG_IGN);
+                const rlimit limit = {limitBytes, limitBytes};
+                setrlimit(RLIMIT_FSIZE, &limit);
+                _exit(AddEvent(1) ? 0 : 1);
+            });
+            EXPECT_EQ(cut.Wait(), 1);
+            EXPECT_EQ(ReadFile(m_queue), c.before) << "the cut record is taken back off";
+            EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("photo"));
+        }
+        ASSERT_TRUE(AddEvent(2));
+        EXPECT_EQ(ReadFile(m_queue), c.after);
+    }
+}
+
+// A status file of the wrong layout is refused by every status call like an unreadable one,
+// instead of an exception thrown out of the library into a caller that cannot expect it.
+TEST_F(HardeningTest, WronglyShapedStatusFileIsRefusedByEveryCall)
+{
+    long long resumeTime = 0;
+    const std::function<bool()> calls[] = {
+        [] { return StatusMgr::IsUpdated("x"); },
+        [] { return StatusMgr::ShareIsNoSpace("photo"); },
+        [] { return StatusMgr::ShareIsNeedReindex("photo"); },
+        [&] { return StatusMgr::GetPauseInfo(resumeTime); },
+        [] { return StatusMgr::SetUpdated("x"); },
+        [] { return StatusMgr::ShareSetNoSpace("photo", true); },
+        [] { return StatusMgr::ShareSetNeedReindex("photo", false); },
+        [] { return StatusMgr::ShareRevive("photo"); },
+        [] { return StatusMgr::Resume(); },
+        [] { return StatusMgr::Pause(1); },
+    };
+    for (const char *document : {"0", "[]", "null", "\"x\"", R"({"need_reindex":5})", R"({"no_space":[]})",
+                                 R"({"no_space":true})", R"({"resume_time":{}})", R"({"resume_time":"abc"})",
+                                 R"({"resume_time":1.5})", R"({"x":"yes"})", R"({"x":[]})"}) {
+        SCOPED_TRACE(document);
+        WriteFile(kStatusConf, document);
+        for (const std::function<bool()> &call : calls) {
+            LogCapture::Clear();
+            ErrorHandler::SetError(FILEIDX_ERR_NONE);
+            EXPECT_FALSE(call());
+            EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_LOAD_CONFIG);
+            EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to load json from " + kStatusConf});
+        }
+        EXPECT_EQ(ReadFile(kStatusConf), document);
+        EXPECT_FALSE(IsLockHeld(kStatusLock));
+        // The event queue's fall-back meets the same refusal and reports it.
+        LogCapture::Clear();
+        EXPECT_FALSE(AddCustomEvent(kEventReindex, HostPath("/volume9/x"), Json::Value()));
+        EXPECT_EQ(LogCapture::Messages(),
+                  (std::vector<std::string>{"VEXOShareNamePathGet failed, path=" + HostPath("/volume9/x"),
+                                            "Failed to load json from " + kStatusConf, "ShareSetNeedReindex failed, share="}));
+    }
+    // What the library itself writes, and integral numbers however spelt, still load.
+    WriteFile(kStatusConf, R"({"resume_time":1.7e9,"no_space":null,"need_reindex":{"a":true},"one":1,"n":null})");
+    EXPECT_TRUE(StatusMgr::GetPauseInfo(resumeTime));
+    EXPECT_EQ(resumeTime, 1700000000);
+    EXPECT_TRUE(StatusMgr::IsUpdated("one"));
+    EXPECT_TRUE(StatusMgr::ShareSetNoSpace("photo", false));
+}
+
+// A temporary file of a saver that died, or that has sat for over an hour (its process number may
+// since belong to another program), is swept by the next save; a recent one of a live saver stays.
+TEST_F(HardeningTest, SaveSweepsTemporariesOfGoneOrLongStalledSavers)
+{
+    const pid_t gone = fork();
+    if (gone == 0) {
+        _exit(0);
+    }
+    waitpid(gone, nullptr, 0);
+    const struct {
+        pid_t pid;
+        int ageSeconds;
+        bool swept;
+    } cases[] = {
+        {gone, 0, true},
+        {getpid(), 7200, true},
+        {getpid(), 60, false},
+        {1, 3000, false},
+    };
+    std::vector<std::string> temporaries;
+    for (const auto &c : cases) {
+        temporaries.push_back(kStatusConf + ".tmp." + std::to_string(c.pid) + ".a" + std::to_string(temporaries.size()));
+        WriteFile(temporaries.back(), "{}");
+        const timeval times[2] = {{time(nullptr) - c.ageSeconds, 0}, {time(nullptr) - c.ageSeconds, 0}};
+        utimes(temporaries.back().c_str(), times);
+    }
+    ASSERT_TRUE(StatusMgr::SetUpdated("x"));
+    for (size_t i = 0; i < temporaries.size(); ++i) {
+        EXPECT_EQ(stdfs::exists(temporaries[i]), !cases[i].swept) << temporaries[i];
+    }
+}
+
+}  // namespace
+}  // namespace fileindex_test
