@@ -144,57 +144,6 @@ TEST_F(HardeningTest, PlantedLinksAreNeverWrittenThrough)
     }
 }
 
-// Every operation returns the descriptors it opened, on success and on each failure it can meet:
-// a busy process would otherwise run out of them and fail every lock.
-TEST_F(HardeningTest, DescriptorsAreReturnedOnEveryPath)
-{
-    FrameListener daemon;
-    LockHolder folderWriter(FILEINDEX_FOLDER_LOCK_PATH, true);
-    char buffer[4096];
-    const struct {
-        const char *name;
-        std::function<void()> run;
-    } cases[] = {
-        {"lock met by another holder", [] {
-             Folders folders;
-             EXPECT_FALSE(folders.Lock(true));
-             folders.Unlock();
-         }},
-        {"lock, unlock twice", [] {
-             Status status;
-             EXPECT_TRUE(status.Lock(true));
-             status.Unlock();
-             status.Unlock();
-         }},
-        {"command saved and sent", [&] {
-             EXPECT_TRUE(StatusMgr::Resume());
-             daemon.Connections(1);
-         }},
-        {"unreadable status file", [] {
-             WriteFile(kStatusConf, "{");
-             EXPECT_FALSE(StatusMgr::SetUpdated("x"));
-             stdfs::remove(kStatusConf);
-         }},
-        {"event appended", [&] { EXPECT_TRUE(AddEvent(1)); }},
-        {"event met by a busy queue", [&] {
-             LockHolder appender(m_queue, true);
-             EXPECT_TRUE(AddEvent(2));
-         }},
-        {"event whose queue cannot be opened", [&] {
-             stdfs::remove(m_queue);
-             stdfs::create_directories(m_queue);
-             EXPECT_FALSE(AddEvent(3));
-             stdfs::remove(m_queue);
-         }},
-        {"database path", [&] { EXPECT_GT(FILEIDXDBPathGet("photo", buffer, sizeof(buffer)), 0); }},
-    };
-    for (const auto &c : cases) {
-        const size_t before = OpenDescriptorCount();
-        c.run();
-        EXPECT_EQ(OpenDescriptorCount(), before) << c.name;
-    }
-}
-
 // An append cut short (disk full, file-size limit) or a writer killed mid-append must not make the
 // next record unreadable: each record ends up whole on its own line, or not in the queue at all.
 TEST_F(HardeningTest, CutAppendNeverSpoilsTheNextRecord)

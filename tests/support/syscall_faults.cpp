@@ -203,20 +203,32 @@ using fileindex_test::PathAt;
 using fileindex_test::PathOfFd;
 using fileindex_test::Syscall;
 
-// The interposed calls: each fails when its fault fires, and otherwise goes on to the C library.
-#define FILEINDEX_PASS_ON(name, Signature, ...)                  \
-    static const auto next = Next<Signature>(name);              \
-    return next(__VA_ARGS__)
+// The interposed calls: each fails when its fault fires for the file where names, and otherwise
+// goes on to the C library.
+#define FILEINDEX_INTERPOSE(Result, name, kind, where, Parameters, Arguments) \
+    Result name Parameters                                                   \
+    {                                                                        \
+        if (Fires(Syscall::kind, [&] { return std::string(where); })) {      \
+            return -1;                                                       \
+        }                                                                    \
+        static const auto next = Next<Result(*) Parameters>(#name);          \
+        return next Arguments;                                               \
+    }
 
 extern "C" {
 
-int chmod(const char *path, mode_t mode)
-{
-    if (Fires(Syscall::kChmod, [&] { return std::string(path); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("chmod", int (*)(const char *, mode_t), path, mode);
-}
+FILEINDEX_INTERPOSE(int, chmod, kChmod, path, (const char *path, mode_t mode), (path, mode))
+FILEINDEX_INTERPOSE(int, fchmod, kFchmod, PathOfFd(fd), (int fd, mode_t mode), (fd, mode))
+FILEINDEX_INTERPOSE(int, flock, kFlock, PathOfFd(fd), (int fd, int operation), (fd, operation))
+FILEINDEX_INTERPOSE(int, fstat, kFstat, PathOfFd(fd), (int fd, struct stat *st), (fd, st))
+FILEINDEX_INTERPOSE(int, fsync, kFsync, PathOfFd(fd), (int fd), (fd))
+FILEINDEX_INTERPOSE(int, ftruncate, kFtruncate, PathOfFd(fd), (int fd, off_t length), (fd, length))
+FILEINDEX_INTERPOSE(off_t, lseek, kLseek, PathOfFd(fd), (int fd, off_t offset, int whence), (fd, offset, whence))
+FILEINDEX_INTERPOSE(int, mkostemp, kMkostemp, pathTemplate, (char *pathTemplate, int flags), (pathTemplate, flags))
+FILEINDEX_INTERPOSE(ssize_t, pread, kPread, PathOfFd(fd), (int fd, void *buffer, size_t size, off_t offset),
+                    (fd, buffer, size, offset))
+FILEINDEX_INTERPOSE(ssize_t, read, kRead, PathOfFd(fd), (int fd, void *buffer, size_t size), (fd, buffer, size))
+FILEINDEX_INTERPOSE(int, rename, kRename, from, (const char *from, const char *to), (from, to))
 
 int close(int fd)
 {
@@ -230,114 +242,34 @@ int close(int fd)
     return next(fd);
 }
 
-int fchmod(int fd, mode_t mode)
-{
-    if (Fires(Syscall::kFchmod, [&] { return PathOfFd(fd); })) {
-        return -1;
+// open and openat take a mode only when they may create.
+#define FILEINDEX_CREATION_MODE(flags)                              \
+    mode_t mode = 0;                                                \
+    if (((flags) & (O_CREAT | O_TMPFILE)) != 0) {                   \
+        va_list args;                                               \
+        va_start(args, flags);                                      \
+        mode = static_cast<mode_t>(va_arg(args, int));              \
+        va_end(args);                                               \
     }
-    FILEINDEX_PASS_ON("fchmod", int (*)(int, mode_t), fd, mode);
-}
-
-int flock(int fd, int operation)
-{
-    if (Fires(Syscall::kFlock, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("flock", int (*)(int, int), fd, operation);
-}
-
-int fstat(int fd, struct stat *st)
-{
-    if (Fires(Syscall::kFstat, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("fstat", int (*)(int, struct stat *), fd, st);
-}
-
-int fsync(int fd)
-{
-    if (Fires(Syscall::kFsync, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("fsync", int (*)(int), fd);
-}
-
-int ftruncate(int fd, off_t length)
-{
-    if (Fires(Syscall::kFtruncate, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("ftruncate", int (*)(int, off_t), fd, length);
-}
-
-off_t lseek(int fd, off_t offset, int whence)
-{
-    if (Fires(Syscall::kLseek, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("lseek", off_t (*)(int, off_t, int), fd, offset, whence);
-}
-
-int mkostemp(char *pathTemplate, int flags)
-{
-    if (Fires(Syscall::kMkostemp, [&] { return std::string(pathTemplate); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("mkostemp", int (*)(char *, int), pathTemplate, flags);
-}
 
 int open(const char *path, int flags, ...)
 {
-    mode_t mode = 0;
-    if ((flags & (O_CREAT | O_TMPFILE)) != 0) {
-        va_list args;
-        va_start(args, flags);
-        mode = static_cast<mode_t>(va_arg(args, int));
-        va_end(args);
-    }
+    FILEINDEX_CREATION_MODE(flags)
     if (Fires(Syscall::kOpen, [&] { return std::string(path); })) {
         return -1;
     }
-    FILEINDEX_PASS_ON("open", int (*)(const char *, int, ...), path, flags, mode);
+    static const auto next = Next<int (*)(const char *, int, ...)>("open");
+    return next(path, flags, mode);
 }
 
 int openat(int dirFd, const char *path, int flags, ...)
 {
-    mode_t mode = 0;
-    if ((flags & (O_CREAT | O_TMPFILE)) != 0) {
-        va_list args;
-        va_start(args, flags);
-        mode = static_cast<mode_t>(va_arg(args, int));
-        va_end(args);
-    }
+    FILEINDEX_CREATION_MODE(flags)
     if (Fires(Syscall::kOpenat, [&] { return PathAt(dirFd, path); })) {
         return -1;
     }
-    FILEINDEX_PASS_ON("openat", int (*)(int, const char *, int, ...), dirFd, path, flags, mode);
-}
-
-ssize_t pread(int fd, void *buffer, size_t size, off_t offset)
-{
-    if (Fires(Syscall::kPread, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("pread", ssize_t (*)(int, void *, size_t, off_t), fd, buffer, size, offset);
-}
-
-ssize_t read(int fd, void *buffer, size_t size)
-{
-    if (Fires(Syscall::kRead, [&] { return PathOfFd(fd); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("read", ssize_t (*)(int, void *, size_t), fd, buffer, size);
-}
-
-int rename(const char *from, const char *to)
-{
-    if (Fires(Syscall::kRename, [&] { return std::string(from); })) {
-        return -1;
-    }
-    FILEINDEX_PASS_ON("rename", int (*)(const char *, const char *), from, to);
+    static const auto next = Next<int (*)(int, const char *, int, ...)>("openat");
+    return next(dirFd, path, flags, mode);
 }
 
 ssize_t write(int fd, const void *buffer, size_t size)
@@ -346,7 +278,8 @@ ssize_t write(int fd, const void *buffer, size_t size)
     if (Fires(Syscall::kWrite, [&] { return PathOfFd(fd); })) {
         return errno == fileindex_test::SyscallFault::kNothingWritten ? 0 : -1;
     }
-    FILEINDEX_PASS_ON("write", ssize_t (*)(int, const void *, size_t), fd, buffer, size);
+    static const auto next = Next<ssize_t (*)(int, const void *, size_t)>("write");
+    return next(fd, buffer, size);
 }
 
 }
