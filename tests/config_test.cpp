@@ -176,7 +176,7 @@ TEST_F(ConfigTest, MissingDocumentIsTheFirstRunAndAnUnreadableOneFailsWithCode6)
 }
 
 // The first save creates the document, mode 0644 (each failing step of a save has its row in the
-// fault loop of fault_loop_test.cpp).
+// fault loops of hardening_test.cpp).
 TEST_F(ConfigTest, FirstSaveCreatesTheDocumentWithMode0644)
 {
     TestDoc doc;

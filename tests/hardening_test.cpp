@@ -6,9 +6,11 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <chrono>
 #include <cstring>
 #include <functional>
+#include <map>
 
 #include "daemon/queue_record.h"
 #include "fileindex/error.h"
@@ -30,6 +32,53 @@ namespace {
 
 const std::string kStatusConf = FILEINDEX_STATUS_CONF_PATH;
 const std::string kStatusLock = FILEINDEX_STATUS_LOCK_PATH;
+const std::string kConfigDir = stdfs::path(kStatusConf).parent_path();
+
+// The n-th call of a kind (counting from 0) within one operation, and what failing it must give.
+using CallSite = std::pair<Syscall, int>;
+struct Outcome {
+    bool changed;  // the call succeeds and the file holds the change; else the file is as it was
+    std::vector<std::string> log;
+    _tag_fileindex_err_ error;
+};
+
+// Runs change(seq) once without faults to learn its calls on files under scope, then once per
+// call with that call failing (EIO), checking the outcome of its row and, through check (given the
+// file as it was before), what the mechanism adds. Every call needs a row, and every row a call.
+void RunFaultLoop(const std::string &scope, const std::string &file, const std::map<CallSite, Outcome> &outcomes,
+                  const std::function<bool(int seq)> &change, const std::function<void(bool changed, int seq, const std::string &before)> &check)
+{
+    std::vector<Syscall> calls;
+    {
+        SyscallTrace trace(scope);
+        ASSERT_TRUE(change(0));
+        calls = trace.Calls();
+    }
+    ASSERT_EQ(calls.size(), outcomes.size()) << "every call needs its row";
+    std::map<Syscall, int> seen;
+    for (size_t i = 0; i < calls.size(); ++i) {
+        const CallSite site(calls[i], seen[calls[i]]++);
+        const int seq = static_cast<int>(i) + 1;
+        SCOPED_TRACE(std::string(SyscallName(site.first)) + " #" + std::to_string(site.second));
+        ASSERT_EQ(outcomes.count(site), 1u) << "a call without a row";
+        const Outcome &expected = outcomes.at(site);
+        const std::string before = ReadFile(file);
+        const size_t descriptors = OpenDescriptorCount();
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        {
+            SyscallFault fault(site.first, EIO, scope, site.second);
+            EXPECT_EQ(change(seq), expected.changed);
+            EXPECT_EQ(fault.Hits(), 1);
+        }
+        EXPECT_EQ(ReadFile(file) == before, !expected.changed);
+        EXPECT_EQ(LogCapture::Messages(), expected.log);
+        EXPECT_EQ(ErrorHandler::GetError(), expected.error);
+        EXPECT_EQ(OpenDescriptorCount(), descriptors);
+        check(expected.changed, seq, before);
+        EXPECT_TRUE(change(seq + 1000)) << "the next call";
+    }
+}
 
 class HardeningTest : public SandboxTest {
 protected:
@@ -253,6 +302,73 @@ TEST_F(HardeningTest, SaveSweepsTemporariesOfGoneOrLongStalledSavers)
     for (size_t i = 0; i < temporaries.size(); ++i) {
         EXPECT_EQ(stdfs::exists(temporaries[i]), !cases[i].swept) << temporaries[i];
     }
+}
+
+// Each system call of a save and of an event append, failed on its own: the previous content stays
+// (or the change is whole), no temporary file or descriptor is left, the error code and log line are
+// the ones the failure calls for, no lock stays held, and the next call succeeds.
+TEST_F(HardeningTest, EachFailedCallOfAStatusSaveLeavesTheFileAsItWas)
+{
+    const Outcome notLoaded = {false, {"Failed to load json from " + kStatusConf}, FILEIDX_ERR_LOAD_CONFIG};
+    const Outcome notSaved = {false, {"Failed to save json to " + kStatusConf}, FILEIDX_ERR_SAVE_CONFIG};
+    const Outcome saved = {true, {}, FILEIDX_ERR_NONE};
+    const std::map<CallSite, Outcome> outcomes = {
+        {{Syscall::kOpen, 0}, notLoaded}, {{Syscall::kRead, 0}, notLoaded}, {{Syscall::kRead, 1}, notLoaded},
+        {{Syscall::kClose, 0}, saved},  // what was read is whole
+        {{Syscall::kMkostemp, 0}, notSaved}, {{Syscall::kFchmod, 0}, notSaved}, {{Syscall::kWrite, 0}, notSaved},
+        {{Syscall::kFsync, 0}, notSaved}, {{Syscall::kClose, 1}, notSaved}, {{Syscall::kRename, 0}, notSaved},
+        // Syncing the directory comes after the rename: the document is replaced already.
+        {{Syscall::kOpen, 1}, saved}, {{Syscall::kFsync, 1}, saved}, {{Syscall::kClose, 2}, saved},
+        {{Syscall::kChmod, 0}, {true, {"chmod failed, path=" + kStatusConf}, FILEIDX_ERR_NONE}},
+    };
+    const auto mark = [](int seq) { return "mark" + std::to_string(seq); };
+    ASSERT_TRUE(StatusMgr::SetUpdated("first"));
+    RunFaultLoop(
+        kConfigDir, kStatusConf, outcomes, [&](int seq) { return StatusMgr::SetUpdated(mark(seq)); },
+        [&](bool changed, int seq, const std::string &) {
+            EXPECT_EQ(ParseJson(ReadFile(kStatusConf)).isMember(mark(seq)), changed);
+            for (const stdfs::directory_entry &entry : stdfs::directory_iterator(kConfigDir)) {
+                EXPECT_EQ(entry.path().filename().string().find(".tmp."), std::string::npos) << entry.path();
+            }
+            EXPECT_FALSE(IsLockHeld(FILEINDEX_STATUS_LOCK_PATH));
+        });
+
+    // A device that accepts nothing, without an error, fails the save instead of spinning.
+    const std::string before = ReadFile(kStatusConf);
+    {
+        SyscallFault fault(Syscall::kWrite, SyscallFault::kNothingWritten, kConfigDir, 0);
+        EXPECT_FALSE(StatusMgr::SetUpdated("never"));
+        EXPECT_EQ(fault.Hits(), 1);
+    }
+    EXPECT_EQ(ReadFile(kStatusConf), before);
+}
+
+TEST_F(HardeningTest, EachFailedCallOfAnAppendLeavesTheQueueWholeOrMarksTheShare)
+{
+    // Looking for a pending reindex fails: logged, and the event is appended all the same.
+    const Outcome scanFailed = {true, {"Failed to open queue=" + m_queue + ", reason=Input/output error"}, FILEIDX_ERR_NONE};
+    const Outcome appended = {true, {}, FILEIDX_ERR_NONE};
+    const Outcome shareMarked = {false, {}, FILEIDX_ERR_NONE};
+    const std::map<CallSite, Outcome> outcomes = {
+        {{Syscall::kOpen, 0}, scanFailed}, {{Syscall::kOpenat, 0}, scanFailed}, {{Syscall::kClose, 0}, appended},
+        {{Syscall::kFstat, 0}, scanFailed}, {{Syscall::kRead, 0}, scanFailed}, {{Syscall::kRead, 1}, scanFailed},
+        {{Syscall::kClose, 1}, appended},
+        // Appending.
+        {{Syscall::kOpen, 1}, shareMarked}, {{Syscall::kOpenat, 1}, shareMarked}, {{Syscall::kClose, 2}, appended},
+        {{Syscall::kFstat, 1}, shareMarked}, {{Syscall::kFlock, 0}, shareMarked}, {{Syscall::kLseek, 0}, shareMarked},
+        {{Syscall::kPread, 0}, shareMarked}, {{Syscall::kWrite, 0}, shareMarked}, {{Syscall::kFlock, 1}, appended},
+        {{Syscall::kClose, 3}, appended},
+    };
+    WriteFile(m_queue, Record(-1));
+    RunFaultLoop(
+        SharePath("photo"), m_queue, outcomes,
+        [&](int seq) { return AddEvent(seq); },
+        [&](bool changed, int seq, const std::string &before) {
+            EXPECT_EQ(ReadFile(m_queue), changed ? before + Record(seq) : before);
+            EXPECT_EQ(StatusMgr::ShareIsNeedReindex("photo"), !changed);
+            EXPECT_FALSE(IsLockHeld(m_queue));
+            ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("photo", false));
+        });
 }
 
 }  // namespace
