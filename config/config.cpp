@@ -27,7 +27,7 @@ Config::~Config() = default;
 bool Config::Lock(bool exclusive)
 {
     const int operation = (exclusive ? LOCK_EX : LOCK_SH) | LOCK_NB;
-    for (int attempts = kLockAttempts; attempts > 0;) {
+    for (int attempts = kLockAttempts;;) {
         // The lock file sits in a directory every account may write: a symbolic link planted in its
         // place is refused, never followed.
         m_fdLock = open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
@@ -37,14 +37,15 @@ bool Config::Lock(bool exclusive)
         if (flock(m_fdLock, operation) == 0) {
             return true;
         }
-        const int reason = errno;
-        close(m_fdLock);  // each attempt opens afresh and returns what it opened
-        m_fdLock = -1;
-        if (reason != EINTR && reason != EAGAIN) {
+        if (errno != EINTR && errno != EAGAIN) {
             break;
         }
         usleep(static_cast<useconds_t>((rand() % 10) * 1000));
-        --attempts;
+        if (--attempts == 0) {
+            break;  // the last attempt's descriptor stays in m_fdLock until Unlock
+        }
+        close(m_fdLock);  // a retry opens the file afresh and returns what the failed attempt opened
+        m_fdLock = -1;
     }
     FILEIDX_LOG("%s:%d Failed to lock folder");
     ErrorHandler::SetError(FILEIDX_ERR_LOCK);

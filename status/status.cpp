@@ -32,8 +32,9 @@ bool SetShareMark(Json::Value &document, const char *key, const std::string &sha
 }
 
 // The layout every operation below can read and change without the JSON library throwing: an
-// object whose share marks are objects (or null, as clearing an absent mark leaves them), whose
-// "resume_time" is a 64-bit integer, and whose other members, the updated marks, read as booleans.
+// object whose share marks are objects (or null, as clearing an absent mark leaves them) and whose
+// updated marks read as booleans. "resume_time" may hold anything: GetPauseInfo reports a pause time
+// it cannot read ("json exception") and every other operation only overwrites it.
 bool IsStatusLayout(const Json::Value &document)
 {
     if (!document.isObject()) {
@@ -41,8 +42,10 @@ bool IsStatusLayout(const Json::Value &document)
     }
     for (auto member = document.begin(); member != document.end(); ++member) {
         const std::string key = member.name();
+        if (key == kResumeTime) {
+            continue;
+        }
         const bool readable = key == kNoSpace || key == kNeedReindex ? member->isObject() || member->isNull()
-                              : key == kResumeTime                  ? member->isInt64()
                                                                     : member->isConvertibleTo(Json::booleanValue);
         if (!readable) {
             return false;

@@ -244,8 +244,7 @@ TEST_F(HardeningTest, WronglyShapedStatusFileIsRefusedByEveryCall)
         [] { return StatusMgr::Pause(1); },
     };
     for (const char *document : {"0", "[]", "null", "\"x\"", R"({"need_reindex":5})", R"({"no_space":[]})",
-                                 R"({"no_space":true})", R"({"resume_time":{}})", R"({"resume_time":"abc"})",
-                                 R"({"resume_time":1.5})", R"({"x":"yes"})", R"({"x":[]})"}) {
+                                 R"({"no_space":true})", R"({"x":"yes"})", R"({"x":[]})"}) {
         SCOPED_TRACE(document);
         WriteFile(kStatusConf, document);
         for (const std::function<bool()> &call : calls) {
@@ -263,6 +262,26 @@ TEST_F(HardeningTest, WronglyShapedStatusFileIsRefusedByEveryCall)
         EXPECT_EQ(LogCapture::Messages(),
                   (std::vector<std::string>{"VEXOShareNamePathGet failed, path=" + HostPath("/volume9/x"),
                                             "Failed to load json from " + kStatusConf, "ShareSetNeedReindex failed, share="}));
+    }
+    // A pause time that cannot be read is the pause query's own failure: it logs "json exception",
+    // sets no error code and leaves the caller's value; the other calls go on working.
+    const struct {
+        const char *document;
+        bool read;
+        long long resumeTime;
+    } pauseTimes[] = {{R"({"resume_time":"abc"})", false, 42}, {R"({"resume_time":{}})", false, 42},
+                      {R"({"resume_time":1.5})", true, 1}};
+    for (const auto &p : pauseTimes) {
+        SCOPED_TRACE(p.document);
+        WriteFile(kStatusConf, p.document);
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        resumeTime = 42;
+        EXPECT_EQ(StatusMgr::GetPauseInfo(resumeTime), p.read);
+        EXPECT_EQ(resumeTime, p.resumeTime);
+        EXPECT_EQ(LogCapture::Messages(), p.read ? std::vector<std::string>{} : std::vector<std::string>{"json exception"});
+        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
+        EXPECT_TRUE(StatusMgr::ShareSetNoSpace("photo", false));
     }
     // What the library itself writes, and integral numbers however spelt, still load.
     WriteFile(kStatusConf, R"({"resume_time":1.7e9,"no_space":null,"need_reindex":{"a":true},"one":1,"n":null})");

@@ -30,14 +30,14 @@ public:
     virtual std::string GetPath() const = 0;
 
     // Takes the flock lock on GetLockPath(), exclusive or shared, creating the lock file (mode 0644)
-    // on first use. Never blocks: up to three attempts with a random 0-9 ms sleep between them,
-    // each closing what it opened when it fails. Fails at once when the lock file cannot be opened
-    // (a symbolic link in its place included) or flock fails otherwise.
+    // on first use. Never blocks: up to three attempts with a random 0-9 ms sleep after each, a retry
+    // closing the descriptor of the attempt before it. Fails at once when the lock file cannot be
+    // opened (a symbolic link in its place included) or flock fails otherwise.
     // Failure: false, error 9 (FILEIDX_ERR_LOCK), "Failed to lock folder" (for either document);
-    // no descriptor is left open.
+    // the last attempt's descriptor stays open until Unlock, which every caller calls in any case.
     bool Lock(bool exclusive);
-    // Releases the lock and closes its descriptor. Does nothing on an object that holds none: one
-    // that never locked, whose Lock failed, or that was already unlocked.
+    // Releases the lock and closes its descriptor, which it then forgets: a second Unlock, or one on
+    // an object that never opened the lock file, does nothing.
     void Unlock();
 
     // Reads GetPath() into the document. A missing file (or anything but a regular file) is the
