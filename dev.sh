@@ -4,10 +4,12 @@
 #   ./dev.sh demo                      build and run the demo on the emulated platform
 #   ./dev.sh test [--werror] [--sanitize]
 #                                      build and run every test (--sanitize: under ASan + UBSan)
+#   ./dev.sh package                   build the Debian packages into build/dev/packages and check them
 set -euo pipefail
 cd "$(dirname "$0")"
 
-packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev)
+packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev
+          help2man dpkg-dev file)
 
 install_missing_packages() {
     local missing=()
@@ -51,8 +53,15 @@ test)
     build "$preset" -DFILEINDEX_WERROR="$werror"
     ctest --preset "$preset" -j "$(nproc)"
     ;;
+package)
+    install_missing_packages
+    build dev
+    rm -rf build/dev/packages
+    cpack --config build/dev/CPackConfig.cmake
+    packaging/check_packages.sh build/dev
+    ;;
 *)
-    sed -n '2,7p' "$0" | sed 's/^# \{0,1\}//'
+    sed -n '2,8p' "$0" | sed 's/^# \{0,1\}//'
     exit 2
     ;;
 esac
