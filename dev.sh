@@ -5,11 +5,15 @@
 #   ./dev.sh test [--werror] [--sanitize]
 #                                      build and run every test (--sanitize: under ASan + UBSan)
 #   ./dev.sh package                   build the Debian packages into build/dev/packages and check them
+#   ./dev.sh fuzz [--werror]           build the fuzz targets with clang and run each on a fixed
+#                                      number of inputs from its seeds in fuzz/corpus
 set -euo pipefail
 cd "$(dirname "$0")"
 
 packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev
           help2man dpkg-dev file)
+# Added for the fuzz targets: clang and its fuzzer and sanitizer runtimes.
+fuzz_packages=(clang libclang-rt-dev)
 
 install_missing_packages() {
     local missing=()
@@ -22,6 +26,28 @@ install_missing_packages() {
     [ "$(id -u)" -ne 0 ] && sudo="sudo"
     $sudo apt-get update -qq
     DEBIAN_FRONTEND=noninteractive $sudo apt-get install -y -qq "${missing[@]}"
+}
+
+# Each fuzz target and the number of inputs it tries: a few seconds apiece on two cores. The seed
+# is fixed, so that a run is repeatable.
+fuzz_targets=(command_frame:50000 queue_record:50000 status_conf:20000 folder_conf:20000)
+
+run_fuzzers() {
+    mkdir -p build/fuzz/artifacts
+    for entry in "${fuzz_targets[@]}"; do
+        local target=${entry%%:*} runs=${entry#*:}
+        # New inputs go to the build tree's corpus; the committed seeds are only read.
+        mkdir -p "build/fuzz/corpus/$target"
+        echo "Fuzzing $target: $runs inputs"
+        if ! "build/fuzz/fuzz/${target}_fuzzer" -runs="$runs" -seed=1 \
+                -artifact_prefix="build/fuzz/artifacts/$target-" "build/fuzz/corpus/$target" "fuzz/corpus/$target" \
+                >"build/fuzz/$target.log" 2>&1; then
+            tail -n 40 "build/fuzz/$target.log"
+            echo "$target failed; the input is in build/fuzz/artifacts. Once fixed, keep it in fuzz/corpus/$target." >&2
+            return 1
+        fi
+        grep -E "^Done" "build/fuzz/$target.log"
+    done
 }
 
 build() {
@@ -60,8 +86,21 @@ package)
     cpack --config build/dev/CPackConfig.cmake
     packaging/check_packages.sh build/dev
     ;;
+fuzz)
+    werror=OFF
+    for option in "$@"; do
+        case "$option" in
+        --werror) werror=ON ;;
+        *) echo "unknown option: $option" >&2; exit 2 ;;
+        esac
+    done
+    packages+=("${fuzz_packages[@]}")
+    install_missing_packages
+    build fuzz -DFILEINDEX_WERROR="$werror"
+    run_fuzzers
+    ;;
 *)
-    sed -n '2,8p' "$0" | sed 's/^# \{0,1\}//'
+    sed -n '2,9p' "$0" | sed 's/^# \{0,1\}//'
     exit 2
     ;;
 esac

@@ -1,0 +1,52 @@
+// One line of a share's event queue, as every scan of a queue judges it. Whatever the line holds,
+// the reader answers without crashing or throwing. A line it accepts says the same when written
+// again as a record, and the same line cut short anywhere, as a writer stopped mid-append leaves
+// it, is never taken for a record.
+#include <cstdlib>
+#include <string>
+
+#include "config/json_io.h"
+#include "daemon/queue_record.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace {
+
+bool SameRecord(const QueueRecord &a, const QueueRecord &b)
+{
+    return a.event == b.event && a.path == b.path && a.pathOld == b.pathOld;
+}
+
+std::string Rewritten(const QueueRecord &record)
+{
+    Json::Value value(Json::objectValue);
+    value["event"] = record.event;
+    value["path"] = record.path;
+    value["path_old"] = record.pathOld;
+    return toString(value);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
+{
+    const std::string line(reinterpret_cast<const char *>(data), size);
+    QueueRecord record;
+    if (!ParseQueueRecord(line, record)) {
+        return 0;
+    }
+    QueueRecord again;
+    if (!ParseQueueRecord(Rewritten(record), again) || !SameRecord(record, again)) {
+        abort();
+    }
+    // Cuts spread over the line, the last one just before its closing brace.
+    const size_t end = line.find_last_not_of(" \t\r\n");
+    const size_t step = end / 64 + 1;
+    for (size_t cut = end % step; cut <= end; cut += step) {
+        QueueRecord torn;
+        if (ParseQueueRecord(line.substr(0, cut), torn)) {
+            abort();
+        }
+    }
+    return 0;
+}
