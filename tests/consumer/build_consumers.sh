@@ -20,8 +20,7 @@ libdir=$(dirname "$(find "$prefix" -name libfileindex.so)")
 export LD_LIBRARY_PATH=$libdir
 export PKG_CONFIG_PATH=$libdir/pkgconfig
 
-cmake -S "$here/find_package" -B "$work/cmake" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" \
-      -DCMAKE_FIND_USE_PACKAGE_REGISTRY=OFF >/dev/null
+cmake -S "$here/find_package" -B "$work/cmake" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build "$work/cmake" >/dev/null
 cc -o "$work/flat_client" "$interface/flat_client.c" $(pkg-config --cflags --libs fileindex)
 c++ -std=c++17 -o "$work/class_client" "$interface/class_client.cpp" $(pkg-config --cflags --libs fileindex)
