@@ -220,6 +220,24 @@ TEST_F(EmulationTest, ServiceCommandIsLaunchedOnceAndStopEndsIt)
     EXPECT_EQ(3u, Journal().size());
 }
 
+// A daemon that needs a moment before it listens: its start returns once it is ready, not before,
+// and a program that ends without getting ready does not hold the start for the whole wait.
+TEST_F(EmulationTest, StartWithAReadyPathReturnsOnceTheProgramIsReady)
+{
+    const std::string ready = Vol("indexd.sock");
+    WriteFile(StatePath("service_commands.json"),
+              R"({"indexd": {"command": ["/bin/sh", "-c", "sleep 0.3; touch )" + ready + R"(; exec sleep 60"],
+                             "ready": ")" + ready + R"("},
+                  "quitter": {"command": ["/bin/true"], "ready": ")" + ready + R"(.never"}})");
+    ASSERT_EQ(0, VLIBServiceStart("indexd", 0));
+    EXPECT_TRUE(stdfs::exists(ready));
+    EXPECT_EQ(0, VLIBServiceStop("indexd", 0));
+
+    const auto started = std::chrono::steady_clock::now();
+    EXPECT_EQ(0, VLIBServiceStart("quitter", 0));
+    EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(2));
+}
+
 TEST_F(EmulationTest, ExecSucceedsOnlyOnExitStatusZero)
 {
     const char *const quoting[] = {"sh", "-c", R"(test "$0" = a && test "$1" = "b c")", "a", "b c", nullptr};

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <time.h>
 #include <unistd.h>
@@ -241,6 +242,15 @@ bool ProcessAlive(const LaunchedProcess &process)
         return false;
     }
     return process.startTime == 0 || process.startTime == startTime;
+}
+
+void WaitForPath(const std::string &path, const LaunchedProcess &process, int seconds)
+{
+    struct stat status;
+    for (int waited = 0; waited < seconds * 100 && lstat(path.c_str(), &status) != 0 && ProcessAlive(process);
+         ++waited) {
+        SleepMilliseconds(10);
+    }
 }
 
 bool TerminateProcess(const LaunchedProcess &process)

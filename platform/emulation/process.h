@@ -33,6 +33,9 @@ bool LaunchDetached(const std::vector<std::string> &argv, LaunchedProcess &proce
 // True while the process exists and has not exited (a zombie has exited).
 bool ProcessAlive(const LaunchedProcess &process);
 
+// Waits until path exists (lstat), the process has ended, or seconds have passed.
+void WaitForPath(const std::string &path, const LaunchedProcess &process, int seconds);
+
 // Sends SIGTERM and waits up to 5 seconds for the process to exit, then sends SIGKILL and waits up
 // to 2 more. True when it is gone (also when it was gone already).
 bool TerminateProcess(const LaunchedProcess &process);

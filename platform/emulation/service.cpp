@@ -19,6 +19,9 @@ namespace {
 
 using CommandTable = Json::Value;
 
+// How long a start waits at most for a launched program to get ready.
+constexpr int kReadySeconds = 5;
+
 bool ParseCommands(const Json::Value &json, CommandTable &commands)
 {
     if (!json.isObject() && !json.isNull()) {
@@ -41,9 +44,17 @@ bool ParseSpotlight(const Json::Value &json, bool &spotlight)
     return true;
 }
 
-// The command of a service: absent (an empty vector), or an array of strings with the program's
-// path first. False when service_commands.json or the service's entry is malformed.
-bool CommandOf(const std::string &service, std::vector<std::string> &command)
+// What starting a service launches: nothing (an empty command), or a program with its arguments,
+// and optionally a path whose appearance means the program is ready.
+struct ServiceCommand {
+    std::vector<std::string> command;
+    std::string ready;
+};
+
+// The command of a service: absent, an array of strings with the program's path first, or an
+// object {"command": that array, "ready": path}. False when service_commands.json or the service's
+// entry is malformed.
+bool CommandOf(const std::string &service, ServiceCommand &launch)
 {
     static CachedStateFile<CommandTable> commands("service_commands.json", ParseCommands);
     const std::shared_ptr<const CommandTable> table = commands.Get();
@@ -54,14 +65,18 @@ bool CommandOf(const std::string &service, std::vector<std::string> &command)
         return true;
     }
     const Json::Value &entry = (*table)[service];
-    if (!entry.isArray() || entry.empty()) {
+    const Json::Value &command = entry.isObject() ? entry["command"] : entry;
+    if (!command.isArray() || command.empty() || (entry.isObject() && !entry.get("ready", "").isString())) {
         return false;
     }
-    for (const Json::Value &arg : entry) {
+    for (const Json::Value &arg : command) {
         if (!arg.isString()) {
             return false;
         }
-        command.push_back(arg.asString());
+        launch.command.push_back(arg.asString());
+    }
+    if (entry.isObject()) {
+        launch.ready = entry.get("ready", "").asString();
     }
     return true;
 }
@@ -102,18 +117,19 @@ int StopLocked(Json::Value &services, const std::string &name)
     return 0;
 }
 
-int StartLocked(Json::Value &services, const std::string &name)
+int StartLocked(Json::Value &services, const std::string &name, std::string &ready)
 {
-    std::vector<std::string> command;
-    if (!CommandOf(name, command)) {
+    ServiceCommand launch;
+    if (!CommandOf(name, launch)) {
         EMU_SET_ERROR(kErrStateFile);
         return -1;
     }
+    ready = launch.ready;
     Json::Value entry(Json::objectValue);
     entry["running"] = true;
-    if (!command.empty()) {
+    if (!launch.command.empty()) {
         LaunchedProcess process;
-        if (!LaunchDetached(command, process)) {
+        if (!LaunchDetached(launch.command, process)) {
             EMU_SET_ERROR(kErrCannotRun);
             return -1;
         }
@@ -147,6 +163,7 @@ int ChangeService(const char *op, ServiceAction action, const char *service, std
         const std::string name = service;
         int outcome = 0;
         std::optional<LaunchedProcess> launched;
+        std::string ready;
         const bool recorded = EditStateObject("services.json", [&](Json::Value &services) {
             const Json::Value entry = services.get(name, Json::Value());
             const bool running = IsRunning(entry);
@@ -158,7 +175,7 @@ int ChangeService(const char *op, ServiceAction action, const char *service, std
             }
             const bool starts = action == ServiceAction::kRestart || (action == ServiceAction::kStart && !running);
             if (outcome == 0 && starts) {
-                outcome = StartLocked(services, name);
+                outcome = StartLocked(services, name, ready);
                 if (outcome == 0) {
                     launched = ProcessOf(services[name]);
                     changed = true;
@@ -171,6 +188,10 @@ int ChangeService(const char *op, ServiceAction action, const char *service, std
                 TerminateProcess(*launched);  // unrecorded, it could never be stopped
             }
             return -1;
+        }
+        // Outside the state lock: the program may use the platform while it gets ready.
+        if (launched && launched->pid > 0 && !ready.empty()) {
+            WaitForPath(ready, *launched, kReadySeconds);
         }
         return outcome;
     }();
