@@ -21,7 +21,7 @@ constexpr RefusalWords kRefusalWords[] = {
     {"unknown_file_system", "its file-system type cannot be told (a missing path, for one)"},
     {"remote_file_system", "on a remote (network) file system"},
     {"image_file_system", "on a file system mounted from an image"},
-    {"file_system_type_12", "on a file system of the platform's type 12, which is never indexed"},
+    {"file_system_type_12", "on a file system of the platform's type 12"},
     {"no_share", "no share holds it"},
     {"share_lookup_failed", "its share cannot be looked up in the share database"},
     {"excluded_share", "its share is never indexed (surveillance, NetBackup)"},
@@ -29,11 +29,10 @@ constexpr RefusalWords kRefusalWords[] = {
     {"encrypted_share", "its share is encrypted"},
     {"read_only_share", "its share is read-only"},
     {"mount_point", "a mount point in a share that does not use encryption"},
-    {"not_canonical", "not its own canonical path (a symbolic link on the way, \".\" or \"..\", a doubled or "
-                      "trailing \"/\"), or it does not exist"},
-    {"path_unresolved", "its share-relative path does not resolve: no such share"},
+    {"not_canonical", "not its own canonical path (a symbolic link, \".\", \"..\" or a stray \"/\"), or missing"},
+    {"path_unresolved", "its share-relative path does not resolve (no such share)"},
     {"no_directory", "its path has no \"/\""},
-    {"reserved_name", "its name is reserved by the system (@eaDir, .DS_Store, the index's own files)"},
+    {"reserved_name", "its name is reserved (@eaDir, .DS_Store, the index's own files)"},
 };
 
 static_assert(std::size(kRefusalWords) == static_cast<size_t>(IndexRefusal::kReservedName) + 1,

@@ -1,4 +1,5 @@
 // fileindexctl folder list|get|add|set|remove: the folder list.
+#include <array>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -11,9 +12,123 @@
 
 namespace fileindexctl {
 
+using VEXO::FILEINDEX::Folder;
 using VEXO::FILEINDEX::IndexMgr;
 
 namespace {
+
+const char kFollowUpHint[] = "folder.conf is saved, but a later step (change monitoring, the service start, a "
+                             "daemon command or an event) failed; the system log names it";
+
+constexpr std::array<const char *, 4> kMedia = {"document", "audio", "video", "photo"};
+
+// What folder add and folder set put into the library's request.
+struct SettingOptions {
+    std::vector<std::string> paths;
+    std::string name;
+    std::array<bool, kMedia.size()> media = {};           // the value given for each medium
+    std::array<CLI::Option *, kMedia.size()> given = {};  // whether it was given at all
+    CLI::Option *nameGiven = nullptr;
+};
+
+// The last component of a share-relative path: what a new folder is called unless named.
+std::string LastComponent(const std::string &path)
+{
+    const size_t slash = path.find_last_of('/', path.size() > 1 ? path.size() - 2 : 0);
+    std::string name = slash == std::string::npos ? path : path.substr(slash + 1);
+    if (!name.empty() && name.back() == '/') {
+        name.pop_back();
+    }
+    return name;
+}
+
+// One request element per path: "path", and the name and media the command line gave; folder add
+// also names every new folder and leaves no medium unset.
+Json::Value SettingRequest(const SettingOptions &options, bool adding)
+{
+    Json::Value request(Json::arrayValue);
+    for (const std::string &path : options.paths) {
+        Json::Value element;
+        element["path"] = path;
+        if (options.nameGiven->count() != 0 || adding) {
+            element["name"] = options.nameGiven->count() != 0 ? options.name : LastComponent(path);
+        }
+        for (size_t i = 0; i < kMedia.size(); ++i) {
+            if (options.given[i]->count() != 0 || adding) {
+                element[kMedia[i]] = options.media[i];
+            }
+        }
+        request.append(element);
+    }
+    return request;
+}
+
+// Prints the stored records of paths after a change.
+int ShowStored(const Context &context, const std::string &what, const std::string &verb,
+               const std::vector<std::string> &paths)
+{
+    std::vector<Folder> folders;
+    if (!ListFolders(folders)) {
+        return Fail(what);
+    }
+    const Json::Value records = RecordsOf(folders, paths);
+    if (context.json) {
+        PrintJson(records);
+    } else {
+        PrintRecordLines(verb, records);
+    }
+    return kSuccess;
+}
+
+int Add(const Context &context, const SettingOptions &options)
+{
+    ClearLastError();
+    if (!IndexMgr::Add(SettingRequest(options, true))) {
+        return Fail("folder add", kFollowUpHint);
+    }
+    return ShowStored(context, "folder add", "added", options.paths);
+}
+
+// Changes what the command line gives of a folder already in the list; an unknown path fails with
+// the library's FILEIDX_ERR_NO_SUCH_FOLDER instead of being added.
+int Set(const Context &context, const SettingOptions &options)
+{
+    ClearLastError();
+    Json::Value record;
+    if (!IndexMgr::Get(record, options.paths.front())) {
+        return Fail("folder set " + options.paths.front());
+    }
+    if (!IndexMgr::Set(SettingRequest(options, false))) {
+        return Fail("folder set " + options.paths.front(), kFollowUpHint);
+    }
+    return ShowStored(context, "folder set", "changed", options.paths);
+}
+
+int Remove(const Context &context, const std::vector<std::string> &paths)
+{
+    ClearLastError();
+    std::vector<Folder> before;
+    if (!ListFolders(before)) {
+        return Fail("folder remove");
+    }
+    Json::Value request(Json::arrayValue);
+    for (const std::string &path : paths) {
+        request.append(path);
+    }
+    if (!IndexMgr::Delete(request)) {
+        return Fail("folder remove", kFollowUpHint);
+    }
+    const Json::Value removed = RecordsOf(before, paths);
+    if (context.json) {
+        PrintJson(removed);
+    } else {
+        PrintRecordLines("removed", removed);
+        if (removed.size() < paths.size()) {
+            std::cout << paths.size() - removed.size() << " of the paths were not in the folder list\n";
+        }
+    }
+    return kSuccess;
+}
 
 struct ListOptions {
     unsigned long offset = 0;
@@ -76,6 +191,34 @@ int Get(const Context &context, const std::string &path)
     return kSuccess;
 }
 
+// folder add and folder set: the paths, --name, and one option per medium, a flag when adding and
+// an on/off value when setting.
+void AddSettingCommand(CLI::App &folder, Context &context, bool adding)
+{
+    auto options = std::make_shared<SettingOptions>();
+    CLI::App *command =
+        adding ? AddCommand(folder, context, "add",
+                            "index folders for the media given (the others off); starts fileindexd if needed",
+                            [&context, options]() { return Add(context, *options); })
+               : AddCommand(folder, context, "set", "change the name or media of an indexed folder",
+                            [&context, options]() { return Set(context, *options); });
+    if (adding) {
+        command->add_option("PATH", options->paths, "share-relative paths, /<share>/<folder>")->required();
+        options->nameGiven = command->add_option("--name", options->name, "display name (default: the folder's name)");
+    } else {
+        command->add_option("PATH", options->paths, "share-relative path of an indexed folder")
+            ->required()
+            ->expected(1);
+        options->nameGiven = command->add_option("--name", options->name, "display name");
+    }
+    for (size_t i = 0; i < kMedia.size(); ++i) {
+        const std::string flag = std::string("--") + kMedia[i];
+        options->given[i] = adding ? command->add_flag(flag, options->media[i], std::string("index ") + kMedia[i])
+                                   : command->add_option(flag, options->media[i],
+                                                         std::string("index ") + kMedia[i] + ": on or off");
+    }
+}
+
 }  // namespace
 
 void AddFolderCommands(CLI::App &app, Context &context)
@@ -102,6 +245,16 @@ void AddFolderCommands(CLI::App &app, Context &context)
     AddCommand(*folder, context, "get", "show one folder's setting (read under the folder lock)",
                [&context, path]() { return Get(context, *path); })
         ->add_option("PATH", *path, "share-relative path of an indexed folder, /<share>/<folder>")
+        ->required();
+
+    AddSettingCommand(*folder, context, true);
+    AddSettingCommand(*folder, context, false);
+
+    auto paths = std::make_shared<std::vector<std::string>>();
+    AddCommand(*folder, context, "remove",
+               "stop indexing folders; the last one stops fileindexd, a share's last one wipes its index",
+               [&context, paths]() { return Remove(context, *paths); })
+        ->add_option("PATH", *paths, "share-relative paths of indexed folders")
         ->required();
 }
 

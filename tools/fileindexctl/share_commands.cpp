@@ -4,12 +4,16 @@
 #include <iostream>
 #include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "commands.h"
 #include "fileindex/fileidx.h"
+#include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
 #include "output.h"
+#include "records.h"
 
 namespace fileindexctl {
 
@@ -77,18 +81,90 @@ int Paths(const Context &context, const std::string &share)
     return kSuccess;
 }
 
+// Prints {"share_name": share}, or the line for people.
+int Done(const Context &context, const std::string &share, const std::string &line)
+{
+    if (context.json) {
+        PrintJson(ShareDocument(share));
+    } else {
+        std::cout << "share " << share << ": " << line << "\n";
+    }
+    return kSuccess;
+}
+
+int Remove(const Context &context, const std::string &share)
+{
+    ClearLastError();
+    std::vector<Folder> before;
+    if (!ListFolders(before, share)) {
+        return Fail("share remove " + share);
+    }
+    if (!IndexMgr::ShareRemove(share)) {
+        return Fail("share remove " + share);
+    }
+    const Json::Value removed = RecordsOf(before);
+    if (context.json) {
+        PrintJson(removed);
+    } else {
+        PrintRecordLines("removed", removed);
+        std::cout << "share " << share << ": folder settings removed: " << removed.size() << "\n";
+    }
+    return kSuccess;
+}
+
+int Rename(const Context &context, const std::string &from, const std::string &to)
+{
+    ClearLastError();
+    std::vector<Folder> after;
+    if (!IndexMgr::ShareRename(from, to) || !ListFolders(after, to)) {
+        return Fail("share rename " + from + " " + to);
+    }
+    const Json::Value records = RecordsOf(after);
+    if (context.json) {
+        PrintJson(records);
+    } else {
+        PrintRecordLines("now", records);
+        std::cout << "share " << from << " is now " << to << ": folder settings moved: " << records.size() << "\n";
+    }
+    return kSuccess;
+}
+
+int PauseShare(const Context &context, const std::string &share)
+{
+    ClearLastError();
+    if (!IndexMgr::SharePause(share)) {
+        return Fail("share pause " + share,
+                    "fileindexd did not take the command, or the share's change monitoring could not be removed");
+    }
+    return Done(context, share, "fileindexd told to delete its worker, change monitoring removed");
+}
+
+int ResumeShare(const Context &context, const std::string &share)
+{
+    ClearLastError();
+    if (!IndexMgr::ShareResume(share)) {
+        return Fail("share resume " + share,
+                    "the share's change monitoring could not be registered, or fileindexd did not take the command");
+    }
+    return Done(context, share, "change monitoring registered, fileindexd told to revive its worker");
+}
+
+int Clean(const Context &context, const std::string &share)
+{
+    ClearLastError();
+    if (!IndexMgr::CleanShareIndexData(share)) {
+        return Fail("share clean " + share, kUnknownShareHint);
+    }
+    return Done(context, share, "event queue and index database removed");
+}
+
 int Revive(const Context &context, const std::string &share)
 {
     ClearLastError();
     if (!StatusMgr::ShareRevive(share)) {
         return Fail("share revive " + share, kDaemonHint);
     }
-    if (context.json) {
-        PrintJson(ShareDocument(share));
-    } else {
-        std::cout << "share " << share << ": out-of-space mark cleared, fileindexd told to revive its worker\n";
-    }
-    return kSuccess;
+    return Done(context, share, "out-of-space mark cleared, fileindexd told to revive its worker");
 }
 
 // Adds "share <name> SHARE" running run(context, share).
@@ -108,6 +184,19 @@ void AddShareCommands(CLI::App &app, Context &context)
     CLI::App *share = app.add_subcommand("share", "shared folders: remove, rename, pause, resume, clean, revive, "
                                                   "space, paths");
     share->require_subcommand(1);
+    AddShareCommand(*share, context, "remove", "the share is gone: drop its folder settings (the last ones stop "
+                                               "fileindexd)", Remove);
+    auto names = std::make_shared<std::pair<std::string, std::string>>();
+    CLI::App *rename = AddCommand(*share, context, "rename",
+                                  "the share was renamed (in the share database first): move its folder settings",
+                                  [&context, names]() { return Rename(context, names->first, names->second); });
+    rename->add_option("OLD", names->first, "the share's old name")->required();
+    rename->add_option("NEW", names->second, "the share's new name")->required();
+    AddShareCommand(*share, context, "pause",
+                    "stop indexing the share: fileindexd deletes its worker, change monitoring removed", PauseShare);
+    AddShareCommand(*share, context, "resume",
+                    "index the share again: change monitoring registered, fileindexd revives its worker", ResumeShare);
+    AddShareCommand(*share, context, "clean", "wipe the share's event queue and index database", Clean);
     AddShareCommand(*share, context, "revive",
                     "clear the share's out-of-space mark and tell fileindexd to revive the share's worker", Revive);
     AddShareCommand(*share, context, "space",

@@ -99,7 +99,8 @@ std::string SnapshotText(const Snapshot &snapshot)
     std::ostringstream text;
     text << "indexing: " << snapshot.status;
     if (snapshot.resumeTime != -1) {
-        text << " (paused " << PauseText(snapshot.resumeTime) << ")";
+        const std::string until = PauseText(snapshot.resumeTime);
+        text << (snapshot.status == "paused" ? " " + until : " (paused " + until + ")");
     }
     text << "\n";
     if (!snapshot.folders.empty()) {
