@@ -154,10 +154,13 @@ void QueueWorker::Step()
             (share.queue.empty() && !Locate(name, share))) {
             continue;
         }
+        // Taking a queue starts its first record, which is done one record time later.
         if (!share.taken) {
             Take(share);
-        }
-        if (!share.taken) {
+            if (share.taken) {
+                m_nextRecord = std::chrono::steady_clock::now() + m_recordTime;
+                return;
+            }
             continue;
         }
         if (!IsShareSpaceEnough(name)) {
