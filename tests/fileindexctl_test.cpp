@@ -1,5 +1,6 @@
 // fileindexctl as a user runs it: a process, its standard output, standard error and exit status.
 #include <fcntl.h>
+#include <signal.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -7,14 +8,16 @@
 #include <string>
 #include <vector>
 
+#include "config/json_io.h"
+#include "platform/service.h"
 #include "tests/support/child.h"
-#include "tests/support/frame_listener.h"
 #include "tests/support/sandbox.h"
 
 namespace fileindex_test {
 namespace {
 
 const std::string kFolderConf = FILEINDEX_FOLDER_CONF_PATH;
+constexpr int kRunLimitMilliseconds = 20000;
 const std::string kStatusConf = FILEINDEX_STATUS_CONF_PATH;
 
 struct Outcome {
@@ -40,6 +43,9 @@ protected:
         DeclareShares("volume1/photo volume2/music");
     }
 
+    // A stand-in daemon a test started through the service start does not outlive the test.
+    void TearDown() override { VLIBServiceStop("fileindexd", 1); }
+
     // Runs fileindexctl with args, its output and error streams going to files of the sandbox.
     static Outcome Ctl(const std::vector<std::string> &args)
     {
@@ -60,8 +66,14 @@ protected:
             execv(FILEINDEXCTL, argv.data());
             _exit(127);
         }
+        // A run that hangs is ended after a time limit, and then reads as killed.
         int status = 0;
-        waitpid(pid, &status, 0);
+        for (int waited = 0; waitpid(pid, &status, WNOHANG) == 0; ++waited) {
+            if (waited == kRunLimitMilliseconds / 10) {
+                kill(pid, SIGKILL);
+            }
+            usleep(10000);
+        }
         return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status), ReadFile(out), ReadFile(err)};
     }
 };
@@ -89,6 +101,9 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         {{"share", "space", "nosuch"}, false, "fileindexctl: share space nosuch failed: error 2 FILEIDX_ERR_PATH: .*"},
         {{"share", "paths", "nosuch"}, false,
          "fileindexctl: share paths nosuch failed: error 0 FILEIDX_ERR_NONE: .*not in the share database.*"},
+        {{"folder", "set", "/photo/b", "--audio", "on"}, false, "fileindexctl: folder set /photo/b failed: error 4 .*"},
+        {{"folder", "add", "/nosuch/a"}, false, "fileindexctl: folder add failed: error 1 FILEIDX_ERR_BAD_PARAM: .*"},
+        {{"reindex", "/music"}, false, "fileindexctl: reindex failed: error 0 FILEIDX_ERR_NONE: .*holds no indexed.*"},
     };
     for (const Row &row : rows) {
         std::unique_ptr<LockHolder> holder;
@@ -101,6 +116,70 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         EXPECT_EQ(outcome.out, "");
         EXPECT_TRUE(std::regex_match(outcome.err, std::regex(row.line + "\n"))) << outcome.err;
     }
+}
+
+// Both output forms carry a path that is not UTF-8, with a quote in it, byte for byte: the table as
+// people read it, and the JSON documents as the library's own records.
+TEST_F(FileindexctlTest, BothOutputFormsKeepThePathBytes)
+{
+    const std::string odd = "/photo/caf\xe9 \"x\"";
+    stdfs::create_directories(SharePath("photo") + "/caf\xe9 \"x\"");
+    Json::Value record = ParseJson(R"({"document": false, "audio": false, "video": false, "photo": true})");
+    record["path"] = odd;
+    record["name"] = "Caf\xe9";
+    Json::Value conf = ParseJson(R"({"/music": {"path": "/music", "name": "M\u00fcsic", "audio": true}})");
+    conf[odd] = record;
+    WriteFile(kFolderConf, VEXO::FILEINDEX::toString(conf));
+
+    const Outcome table = Ctl({"folder", "list", "--with", "is_valid"});
+    EXPECT_EQ(table.out, "PATH             NAME   MEDIA  VALID\n"
+                         "/music           M\u00fcsic  audio  yes\n"
+                         "/photo/caf\xe9 \"x\"  Caf\xe9   photo  yes\n"
+                         "2 of 2 folders\n");
+    const Outcome json = Ctl({"folder", "list", "--with", "is_valid", "--json"});
+    record["additional"]["is_valid"] = true;
+    EXPECT_EQ(ParseJson(json.out)["folder"][1], record);
+    EXPECT_NE(json.out.find("\"/photo/caf\xe9 \\\"x\\\"\""), std::string::npos) << json.out;  // raw, not \u00e9
+
+    const Outcome check = Ctl({"check", odd, "/photo/#recycle", "/nosuch/a", "--json"});
+    const Json::Value checks = ParseJson(check.out);
+    EXPECT_EQ(check.status, 0);
+    EXPECT_EQ(checks[0]["path"], odd);
+    EXPECT_EQ(checks[0]["indexed"], true);
+    EXPECT_EQ(checks[1]["refusal"], "recycle_bin");
+    EXPECT_EQ(checks[1]["crawler_skips"], true);
+    EXPECT_EQ(checks[2]["refusal"], "path_unresolved");
+    EXPECT_TRUE(checks[2]["crawler_skips"].isNull());
+}
+
+// The first folder starts the stand-in daemon through the service start; status --watch --json
+// returns once it has worked through the queue; removing the last folder stops it again.
+TEST_F(FileindexctlTest, FolderAddedIsIndexedWhileWatchedAndRemovedAgain)
+{
+    const std::string frames = HostPath("/frames.jsonl");
+    Json::Value commands;
+    // Each record takes long enough for the watch to find the queue still pending.
+    for (const char *arg : {FILEINDEX_STANDIN_DAEMON, "--output", frames.c_str(), "--process-queues",
+                            "--record-time", "300"}) {
+        commands["fileindexd"]["command"].append(arg);
+    }
+    commands["fileindexd"]["ready"] = FILEINDEX_DAEMON_SOCKET_PATH;
+    WriteFile(StatePath("service_commands.json"), VEXO::FILEINDEX::toString(commands));
+
+    const Outcome added = Ctl({"folder", "add", "/photo", "--photo", "--json"});
+    EXPECT_EQ(added.status, 0) << added.err;
+    EXPECT_EQ(ParseJson(added.out), ParseJson(R"([{"path": "/photo", "name": "photo", "document": false,
+                                                   "audio": false, "video": false, "photo": true}])"));
+    const Outcome watched = Ctl({"status", "--watch", "--interval", "0.05", "--json"});
+    EXPECT_EQ(ParseJson(watched.out), ParseJson(R"({"status": "finished", "resume_time": -1,
+                                                     "folder": {"/photo": "finished"}})"));
+    EXPECT_EQ(ReadFile(frames), "{\"data\":{\"folder_path\":\"/photo\"},\"type\":\"upsert_folder_setting\"}\n");
+    EXPECT_NE(ReadFile(SharePath("photo") + "/@eaDir/VEXO@.fileindexdb/index.jsonl").find("131072"),
+              std::string::npos);
+
+    const Outcome removed = Ctl({"folder", "remove", "/photo"});
+    EXPECT_EQ(removed.out, "removed /photo (\"photo\", photo)\n");
+    EXPECT_EQ(ParseJson(ReadFile(StatePath("services.json")))["fileindexd"], ParseJson(R"({"running": false})"));
 }
 
 }  // namespace
