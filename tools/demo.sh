@@ -1,0 +1,192 @@
+#!/usr/bin/env bash
+# fileindex-demo: a living appliance in the build's sandbox. It sets up two volumes with shares and
+# files (an encrypted, a read-only and an excluded share among them, a recycle bin and a snapshot),
+# lets the first folder setting start the stand-in for fileindexd through the emulated service
+# start, and walks through the work of a management program with fileindexctl, printing every
+# command before it runs it. The sandbox stays for exploring afterwards.
+#
+#   demo.sh ROOT STATE TOOLS
+# ROOT is the build's sandbox root (FILEINDEX_ROOT), STATE the emulated platform's state directory
+# and TOOLS the directory of fileindexctl and fileindex-standin-daemon; the build's fileindex-demo
+# passes them.
+set -euo pipefail
+
+if [ $# -ne 3 ] || [ -z "$1" ]; then
+    echo "usage: demo.sh ROOT STATE TOOLS (run the build's tools/fileindex-demo; it needs a sandbox root)" >&2
+    exit 2
+fi
+root=$1
+state=$2
+tools=$(cd "$3" && pwd)
+export PATH="$tools:$PATH"
+
+step() {
+    printf '\n== %s\n' "$*"
+}
+
+# Prints the command, runs it, and goes on whatever its exit status (which it shows when not 0).
+run() {
+    printf '$ %s\n' "$*"
+    local status=0
+    "$@" 2>&1 || status=$?
+    if [ "$status" -ne 0 ]; then
+        printf '(exit status %d)\n' "$status"
+    fi
+}
+
+# Prints a shell command line, then runs it in the shell.
+run_sh() {
+    printf '$ %s\n' "$1"
+    bash -c "$1"
+}
+
+# Waits up to five seconds for a condition, quietly.
+wait_for() {
+    for _ in $(seq 50); do
+        if bash -c "$1" >/dev/null 2>&1; then
+            return 0
+        fi
+        sleep 0.1
+    done
+    echo "gave up waiting for: $1" >&2
+    return 1
+}
+
+# A sandbox appliance: the directories of its fixed files, the shares of the emulated share
+# database with a few files each, the administrators' notification tool, and the stand-in daemon as
+# the command of the "fileindexd" service.
+set_up_appliance() {
+    # A stand-in daemon left running by an interrupted walk goes first.
+    local pid
+    pid=$(sed -n 's/.*"fileindexd":{[^}]*"pid":\([0-9]*\).*/\1/p' "$state/services.json" 2>/dev/null || true)
+    if [ -n "$pid" ] && grep -qs fileindex-standin-daemon "/proc/$pid/cmdline"; then
+        kill "$pid" 2>/dev/null || true
+    fi
+    mkdir -p "$root"
+    find "$root" -mindepth 1 -maxdepth 1 -exec rm -rf {} +
+    mkdir -p "$root/usr/vexo/etc/fileindex" "$root/usr/vexo/bin" "$root/tmp" "$root/var/run" "$state"
+
+    cd "$root"
+    mkdir -p volume1/photo/holiday volume1/photo/family volume1/photo/usb volume1/photo/#recycle \
+        volume1/photo/#snapshot/GMT+00-2024.06.01/holiday volume1/video/films volume1/docs/cdrom \
+        volume2/music/albums volume2/vault volume2/archive volume2/surveillance/cam1
+    touch volume1/photo/holiday/beach.jpg volume1/photo/holiday/sunset.jpg volume1/photo/family/birthday.jpg \
+        volume1/photo/#recycle/blurred.jpg volume1/photo/#snapshot/GMT+00-2024.06.01/holiday/beach.jpg \
+        volume1/video/films/harbour.mp4 volume1/docs/manual.pdf volume2/music/albums/overture.flac \
+        volume2/vault/keys.txt volume2/archive/2019.tar
+    ln -s holiday volume1/photo/latest
+
+    cat >emulation/shares.json <<EOF
+[
+  {"name": "photo", "path": "$root/volume1/photo"},
+  {"name": "video", "path": "$root/volume1/video"},
+  {"name": "docs", "path": "$root/volume1/docs"},
+  {"name": "music", "path": "$root/volume2/music"},
+  {"name": "vault", "path": "$root/volume2/vault", "encrypted": true, "uses_encryption": true},
+  {"name": "archive", "path": "$root/volume2/archive", "read_only": true},
+  {"name": "surveillance", "path": "$root/volume2/surveillance"}
+]
+EOF
+    # A USB disk mounted inside photo and a CD image inside docs, as the platform would report them.
+    cat >emulation/faults.json <<EOF
+{"VEXOFSDirIsMntPoint": [{"match": "$root/volume1/photo/usb", "result": 1}],
+ "VEXOGetFSType": [{"match": "$root/volume1/docs/cdrom", "result": 10}]}
+EOF
+    # The service's start returns once the daemon listens on its socket.
+    cat >emulation/service_commands.json <<EOF
+{"fileindexd": {"command": ["$tools/fileindex-standin-daemon", "--output", "$root/fileindexd-commands.jsonl",
+                            "--process-queues", "--record-time", "300"],
+                "ready": "$root/var/run/fileindexd.sock"}}
+EOF
+    cat >usr/vexo/bin/vexohvxnotify <<EOF
+#!/bin/sh
+echo "\$*" >>"$root/notifications.log"
+EOF
+    chmod 755 usr/vexo/bin/vexohvxnotify
+}
+
+printf 'libfileindex demo: a sandbox appliance in %s\n' "$root"
+printf 'fileindexctl and the stand-in daemon come from %s\n' "$tools"
+set_up_appliance
+
+step "The appliance: two volumes, seven shares (vault encrypted, archive read-only)"
+run ls volume1 volume2
+run fileindexctl status
+
+step "Add folders: the first one starts fileindexd (the stand-in) through the emulated service start"
+run fileindexctl folder add /photo/holiday --name Holiday --photo
+run fileindexctl folder add /photo/family --name Family --photo --document
+run fileindexctl folder add /music --audio
+run fileindexctl folder list --with status,is_valid
+run_sh "grep -o '\"op\":\"[^\"]*\"' emulation/journal.jsonl | sort | uniq -c"
+run fileindexctl status --watch --interval 0.2
+
+step "Pause: new work waits in the queues"
+run fileindexctl pause --hours 2
+run fileindexctl folder add /video --name Films --video
+run fileindexctl reindex /photo/holiday
+run cat fileindexd-commands.jsonl
+run cat volume1/video/@eaDir/VEXO@file_index_queue volume1/photo/@eaDir/VEXO@file_index_queue
+run fileindexctl status
+
+step "Resume: the daemon takes each queue, works through its records and removes it"
+run fileindexctl resume
+run fileindexctl status --watch --interval 0.2
+run cat volume1/video/@eaDir/VEXO@.fileindexdb/index.jsonl
+
+step "What may be indexed, and which rule refuses what may not"
+run fileindexctl check /photo /photo/holiday /photo/#recycle /photo/#snapshot/GMT+00-2024.06.01 /photo/latest \
+    /photo/usb /photo/@eaDir /docs/cdrom /vault /archive /surveillance/cam1 /nosuch/folder
+
+step "Another process holds the folder list's lock: the change fails at once, with a line that says why"
+run_sh "flock tmp/fileidx_cfg_folder.lock sleep 1 &"
+wait_for "! flock -n tmp/fileidx_cfg_folder.lock true"
+run fileindexctl folder set /music --name Albums
+wait_for "flock -n tmp/fileidx_cfg_folder.lock true"
+run fileindexctl folder set /music --name Albums --document off
+
+step "music runs out of space: the daemon marks it and the administrators are told"
+run_sh "sed -i 's#^{#{\"VEXOQuotaIsEnough\": [{\"match\": \"$root/volume2/music\", \"result\": 0, \"error\": 10496}],\\n #' emulation/faults.json"
+run fileindexctl reindex /music
+wait_for "fileindexctl share space music | grep -q marked"
+run fileindexctl share space music
+run fileindexctl status /music
+run cat notifications.log
+
+step "Space is freed: revive the share and let the daemon finish"
+run_sh "sed -i '/VEXOQuotaIsEnough/d' emulation/faults.json"
+run fileindexctl share revive music
+run fileindexctl status --watch --interval 0.2
+
+step "Pause and resume one share, then an upgrade brings everything in line"
+run fileindexctl share pause photo
+run fileindexctl share resume photo
+run fileindexctl upgrade
+run fileindexctl status --watch --interval 0.2
+
+step "The video share is renamed films, then the docs share goes"
+run mv volume1/video volume1/films
+run_sh "sed -i 's#\"video\", \"path\": \"\\(.*\\)/video\"#\"films\", \"path\": \"\\1/films\"#' emulation/shares.json"
+run fileindexctl share rename video films
+run fileindexctl folder add /docs --document
+run fileindexctl share remove docs
+run fileindexctl folder list --sort name --with status
+
+step "Remove folders until none is left: fileindexd stops and Spotlight goes off"
+run fileindexctl folder remove /photo/holiday /photo/family
+run ls -lA volume1/photo/@eaDir
+run fileindexctl folder remove /music /films
+run cat emulation/services.json emulation/smb.json
+run fileindexctl folder list
+
+step "The sandbox stays: explore it with fileindexctl"
+cat <<EOF
+  export PATH="$tools:\$PATH"; cd "$root"
+  fileindexctl folder add /photo/holiday --photo    # starts the stand-in daemon again
+  fileindexctl status --watch
+  fileindexctl check /photo/#recycle
+  fileindexctl folder list --with status,is_valid --json
+  fileindexctl --help
+The frames the daemon received are in fileindexd-commands.jsonl, the platform's calls in
+emulation/journal.jsonl. The test suite rebuilds this sandbox when it runs.
+EOF
