@@ -2,7 +2,8 @@
 // line per command received, the command's JSON text exactly as it arrived, to a file or to
 // standard output. A frame that breaks the framing rules is written as {"malformed": reason}.
 // With --process-queues it also works through the shares' event queues as fileindexd would
-// (standin_queue_worker.h), so that indexing progress moves on to "finished".
+// (standin_queue_worker.h), so that indexing progress moves on to "finished", and it ends once its
+// socket is gone.
 //
 // Frame: a 4-byte length in host byte order counting the terminating NUL, the JSON text, the NUL.
 // One frame per connection. The socket appears only once it accepts connections, so a program
@@ -11,6 +12,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/un.h>
 #include <unistd.h>
 
@@ -129,6 +131,13 @@ int Listen(const std::string &socketPath)
     return fd;
 }
 
+// Whether path still names the file seen as known.
+bool IsSameFile(const std::string &path, const struct stat &known)
+{
+    struct stat now;
+    return stat(path.c_str(), &now) == 0 && now.st_ino == known.st_ino && now.st_dev == known.st_dev;
+}
+
 }  // namespace
 
 int main(int argc, char **argv)
@@ -166,9 +175,18 @@ int main(int argc, char **argv)
         std::cerr << "cannot listen on " << socketPath << ": " << strerror(errno) << "\n";
         return 1;
     }
+    // Working through queues, the stand-in ends once its socket is gone or replaced (a sandbox
+    // rebuilt under it), so that it never takes the queues of a later appliance.
+    struct stat listening;
+    if (stat(socketPath.c_str(), &listening) != 0) {
+        return 1;
+    }
     fileindex_standin::QueueWorker worker{std::chrono::milliseconds(recordMilliseconds)};
     for (int received = 0; !g_stop && (count == 0 || received < count);) {
         if (processQueues) {
+            if (!IsSameFile(socketPath, listening)) {
+                break;
+            }
             worker.Step();
             pollfd waiting = {listener, POLLIN, 0};
             if (poll(&waiting, 1, kStepMilliseconds) <= 0) {
@@ -195,6 +213,8 @@ int main(int argc, char **argv)
         ++received;
     }
     close(listener);
-    unlink(socketPath.c_str());
+    if (IsSameFile(socketPath, listening)) {
+        unlink(socketPath.c_str());
+    }
     return 0;
 }
