@@ -116,6 +116,11 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         EXPECT_EQ(outcome.out, "");
         EXPECT_TRUE(std::regex_match(outcome.err, std::regex(row.line + "\n"))) << outcome.err;
     }
+    // A wrong command line is not the library's failure: status 2, and one line all the same.
+    const Outcome usage = Ctl({"folder", "get"});
+    EXPECT_EQ(usage.status, 2);
+    EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
+        << usage.err;
 }
 
 // Both output forms carry a path that is not UTF-8, with a quote in it, byte for byte: the table as

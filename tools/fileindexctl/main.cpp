@@ -2,7 +2,7 @@
 // interface. Tables for people by default, one JSON document with --json; exit status 0 on
 // success, 1 with one line on standard error naming the library's error code when a call fails,
 // 2 when the command line is wrong.
-#include <iostream>
+#include <string>
 
 #include <CLI/CLI.hpp>
 
@@ -31,6 +31,9 @@ int main(int argc, char **argv)
                  "fileindexctl"};
     app.set_version_flag("--version", "fileindexctl " FILEINDEX_VERSION);
     app.require_subcommand(1);
+    app.failure_message([](const CLI::App *, const CLI::Error &error) {
+        return "fileindexctl: " + std::string(error.what()) + " (see --help)\n";
+    });
     app.footer("Every subcommand takes --json and has its own --help. Paths are share-relative, /<share>/<folder>, "
                "unless a subcommand says otherwise.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
