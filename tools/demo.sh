@@ -24,14 +24,37 @@ step() {
     printf '\n== %s\n' "$*"
 }
 
-# Prints the command, runs it, and goes on whatever its exit status (which it shows when not 0).
+# Ends the stand-in daemon that the emulated service start launched, if it still runs.
+stop_standin() {
+    local pid
+    pid=$(sed -n 's/.*"fileindexd":{[^}]*"pid":\([0-9]*\).*/\1/p' "$state/services.json" 2>/dev/null || true)
+    if [ -n "$pid" ] && grep -qs fileindex-standin-daemon "/proc/$pid/cmdline"; then
+        kill "$pid" 2>/dev/null || true
+    fi
+}
+
+# A walk that stops early leaves no daemon behind.
+trap 'status=$?; [ "$status" -eq 0 ] || stop_standin; exit "$status"' EXIT
+
+# Prints the command and runs it; a failure ends the walk (exit status 1).
 run() {
+    printf '$ %s\n' "$*"
+    "$@" 2>&1 || {
+        printf '(exit status %d: the walk stops here)\n' "$?"
+        exit 1
+    }
+}
+
+# Prints the command and runs it where it is meant to fail, showing its exit status.
+run_failing() {
     printf '$ %s\n' "$*"
     local status=0
     "$@" 2>&1 || status=$?
-    if [ "$status" -ne 0 ]; then
-        printf '(exit status %d)\n' "$status"
+    if [ "$status" -eq 0 ]; then
+        printf '(it succeeded, but should have failed: the walk stops here)\n'
+        exit 1
     fi
+    printf '(exit status %d)\n' "$status"
 }
 
 # Prints a shell command line, then runs it in the shell.
@@ -56,12 +79,7 @@ wait_for() {
 # database with a few files each, the administrators' notification tool, and the stand-in daemon as
 # the command of the "fileindexd" service.
 set_up_appliance() {
-    # A stand-in daemon left running by an interrupted walk goes first.
-    local pid
-    pid=$(sed -n 's/.*"fileindexd":{[^}]*"pid":\([0-9]*\).*/\1/p' "$state/services.json" 2>/dev/null || true)
-    if [ -n "$pid" ] && grep -qs fileindex-standin-daemon "/proc/$pid/cmdline"; then
-        kill "$pid" 2>/dev/null || true
-    fi
+    stop_standin  # one left running by an interrupted walk
     mkdir -p "$root"
     find "$root" -mindepth 1 -maxdepth 1 -exec rm -rf {} +
     mkdir -p "$root/usr/vexo/etc/fileindex" "$root/usr/vexo/bin" "$root/tmp" "$root/var/run" "$state"
@@ -141,7 +159,7 @@ run fileindexctl check /photo /photo/holiday /photo/#recycle /photo/#snapshot/GM
 step "Another process holds the folder list's lock: the change fails at once, with a line that says why"
 run_sh "flock tmp/fileidx_cfg_folder.lock sleep 1 &"
 wait_for "! flock -n tmp/fileidx_cfg_folder.lock true"
-run fileindexctl folder set /music --name Albums
+run_failing fileindexctl folder set /music --name Albums
 wait_for "flock -n tmp/fileidx_cfg_folder.lock true"
 run fileindexctl folder set /music --name Albums --document off
 
