@@ -17,8 +17,8 @@ using VEXO::FILEINDEX::IndexMgr;
 
 namespace {
 
-const char kFollowUpHint[] = "folder.conf is saved, but a later step (change monitoring, the service start, a "
-                             "daemon command or an event) failed; the system log names it";
+const char kFollowUpHint[] = "a step that sets no code failed (an empty path, or after folder.conf was saved: change "
+                             "monitoring, the service start, a daemon command, an event); the system log names it";
 
 constexpr std::array<const char *, 4> kMedia = {"document", "audio", "video", "photo"};
 
@@ -111,11 +111,7 @@ int Remove(const Context &context, const std::vector<std::string> &paths)
     if (!ListFolders(before)) {
         return Fail("folder remove");
     }
-    Json::Value request(Json::arrayValue);
-    for (const std::string &path : paths) {
-        request.append(path);
-    }
-    if (!IndexMgr::Delete(request)) {
+    if (!IndexMgr::Delete(PathArray(paths))) {
         return Fail("folder remove", kFollowUpHint);
     }
     const Json::Value removed = RecordsOf(before, paths);

@@ -83,10 +83,7 @@ int Check(const Context &context, const std::vector<std::string> &paths)
 
 int Reindex(const Context &context, const std::vector<std::string> &paths)
 {
-    Json::Value request(Json::arrayValue);
-    for (const std::string &path : paths) {
-        request.append(path);
-    }
+    const Json::Value request = PathArray(paths);
     ClearLastError();
     if (!IndexMgr::Reindex(request)) {
         return Fail("reindex", "a path's share holds no indexed folder (which logs nothing), or an event could not "

@@ -38,6 +38,10 @@ std::string YesNo(bool value);
 // its own code there and not one from an earlier failure.
 void ClearLastError();
 
+// What to try when a status change was saved but its daemon command was not taken.
+constexpr char kDaemonHint[] =
+    "the change is saved, but fileindexd did not take the command: is the indexing service running? Retry once it is";
+
 // Prints "fileindexctl: <what> failed: error <n> <NAME>: <meaning>; <advice>" on standard error and
 // returns kFailure. When the library recorded no code, hintWithoutCode (if given) stands in for
 // the general advice to read the system log.

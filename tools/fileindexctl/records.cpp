@@ -34,6 +34,15 @@ Json::Value RecordsOf(const std::vector<Folder> &folders)
     return records;
 }
 
+Json::Value PathArray(const std::vector<std::string> &paths)
+{
+    Json::Value array(Json::arrayValue);
+    for (const std::string &path : paths) {
+        array.append(path);
+    }
+    return array;
+}
+
 std::string MediaText(const Json::Value &record)
 {
     std::string media;

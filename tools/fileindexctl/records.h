@@ -18,6 +18,9 @@ bool ListFolders(std::vector<VEXO::FILEINDEX::Folder> &folders, const std::strin
 Json::Value RecordsOf(const std::vector<VEXO::FILEINDEX::Folder> &folders, const std::vector<std::string> &paths);
 Json::Value RecordsOf(const std::vector<VEXO::FILEINDEX::Folder> &folders);
 
+// The paths as a JSON array of strings, the request form of the library's batch operations.
+Json::Value PathArray(const std::vector<std::string> &paths);
+
 // The media a record indexes, "document,photo", or "-" for none.
 std::string MediaText(const Json::Value &record);
 // One record as "path", "name" and "media" lines.

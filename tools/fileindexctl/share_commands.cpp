@@ -22,7 +22,6 @@ using namespace VEXO::FILEINDEX;
 namespace {
 
 const char kUnknownShareHint[] = "the share is not in the share database; the system log has the platform's code";
-const char kDaemonHint[] = "fileindexd did not take the command: is the indexing service running? Retry once it is";
 
 Json::Value ShareDocument(const std::string &share)
 {

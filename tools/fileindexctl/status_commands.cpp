@@ -24,9 +24,6 @@ using VEXO::FILEINDEX::StatusMgr;
 
 namespace {
 
-const char kDaemonHint[] = "the change is saved, but fileindexd did not take the command: is the indexing service "
-                           "running? Retry once it is";
-
 volatile sig_atomic_t g_interrupted = 0;
 
 void OnInterrupt(int)
