@@ -20,7 +20,7 @@ constexpr int kKinds = static_cast<int>(Syscall::kCount);
 struct Armed {
     std::atomic<int> errnoValue{0};
     std::atomic<int> hits{0};
-    int skip = -1;  // -1: every call fails; otherwise the calls in scope that pass before one fails
+    int skip = 0;  // the calls in scope that pass before one fails
     int seen = 0;
 };
 
@@ -63,17 +63,17 @@ bool Fires(Syscall call, const Where &where)
         std::lock_guard<std::mutex> lock(g_traceMutex);
         return g_tracing;
     }();
-    bool inScope = false;
-    if (tracing || (value != 0 && armed.skip >= 0)) {
-        const std::string path = where();
-        inScope = path == g_scope || path.rfind(g_scope + "/", 0) == 0;
+    if (!tracing && value == 0) {
+        return false;
     }
+    const std::string path = where();
+    const bool inScope = path == g_scope || path.rfind(g_scope + "/", 0) == 0;
     if (tracing && inScope) {
         std::lock_guard<std::mutex> lock(g_traceMutex);
         g_trace.push_back(call);
     }
     const bool repeats = value == SyscallFault::kNothingWritten && armed.hits < 1000;
-    if (value == 0 || (armed.skip >= 0 && (!inScope || (armed.seen++ != armed.skip && !repeats)))) {
+    if (value == 0 || !inScope || (armed.seen++ != armed.skip && !repeats)) {
         return false;
     }
     ++armed.hits;
@@ -116,8 +116,6 @@ const char *SyscallName(Syscall call)
                                                "mkostemp", "open", "openat", "pread", "read", "rename", "write"};
     return kNames[static_cast<int>(call)];
 }
-
-SyscallFault::SyscallFault(Syscall call, int errnoValue) : SyscallFault(call, errnoValue, std::string(), -1) {}
 
 SyscallFault::SyscallFault(Syscall call, int errnoValue, const std::string &scope, int skip) : m_call(call)
 {

@@ -17,16 +17,15 @@ enum class Syscall {
 };
 const char *SyscallName(Syscall call);
 
-// Fails calls of one kind with errnoValue until the guard's end. The first form fails every call;
-// the second only calls on the directory scope or on files under it, and of those only the one
-// after the first skip. A failed close still closes the descriptor, as the system does.
+// Fails, with errnoValue, the call of one kind on the directory scope or on files under it that
+// comes after the first skip such calls, until the guard's end. A failed close still closes the
+// descriptor, as the system does.
 class SyscallFault {
 public:
     // In place of an errno: the write returns 0, as a full device may, and keeps doing so for
     // the calls after it too (a thousand at most, so that a writer that retries for ever ends).
     static constexpr int kNothingWritten = -1;
 
-    SyscallFault(Syscall call, int errnoValue);
     SyscallFault(Syscall call, int errnoValue, const std::string &scope, int skip);
     ~SyscallFault();
     SyscallFault(const SyscallFault &) = delete;
