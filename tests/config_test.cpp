@@ -1,5 +1,6 @@
-// The lockable JSON document: locking between processes, loading, and saves that never lose or tear
-// the previous document.
+// The lockable JSON document: locking between processes, loading, saves that never lose or tear the
+// previous document, and the reading of JSON text. (Writing is checked byte for byte wherever the
+// library writes: the documents, the frames, the queue records.)
 #include <fcntl.h>
 #include <signal.h>
 #include <spawn.h>
@@ -12,6 +13,7 @@
 #include <chrono>
 #include <set>
 
+#include "config/json_io.h"
 #include "fileindex/config.h"
 #include "fileindex/error.h"
 #include "tests/support/child.h"
@@ -40,16 +42,6 @@ public:
     Json::Value &Doc() { return m_jsConfig; }
     int LockFd() const { return m_fdLock; }
 };
-
-// Takes the lock without blocking from another process; true when it was free.
-bool LockIsFreeForOthers(const std::string &path)
-{
-    Child probe([&path](const Child::Ready &) {
-        const int fd = open(path.c_str(), O_RDWR);
-        _exit(fd >= 0 && flock(fd, LOCK_EX | LOCK_NB) == 0 ? 0 : 1);
-    });
-    return probe.Wait() == 0;
-}
 
 std::vector<std::string> TempFilesBesideDoc()
 {
@@ -104,7 +96,7 @@ TEST_F(ConfigTest, UnlockReleasesTheLockAndTheDestructorDoesNot)
         SCOPED_TRACE(unlock ? "Unlock" : "destructor");
         auto doc = std::make_unique<TestDoc>();
         ASSERT_TRUE(doc->Lock(true));
-        EXPECT_FALSE(LockIsFreeForOthers(kLockPath));
+        EXPECT_TRUE(IsLockHeld(kLockPath));
         const int fd = doc->LockFd();
         if (unlock) {
             doc->Unlock();
@@ -116,7 +108,7 @@ TEST_F(ConfigTest, UnlockReleasesTheLockAndTheDestructorDoesNot)
             close(reused);
         }
         doc.reset();
-        EXPECT_EQ(LockIsFreeForOthers(kLockPath), unlock);
+        EXPECT_EQ(IsLockHeld(kLockPath), !unlock);
         if (!unlock) {
             close(fd);  // what the end of the process would do
         }
@@ -136,10 +128,10 @@ TEST_F(ConfigTest, AProgramStartedWhileTheLockIsHeldDoesNotInheritIt)
     const char *argv[] = {"/bin/sleep", "5", nullptr};
     ASSERT_EQ(posix_spawn(&pid, argv[0], nullptr, nullptr, const_cast<char **>(argv), environ), 0);
     doc.Unlock();
-    const bool free = LockIsFreeForOthers(kLockPath);
+    const bool held = IsLockHeld(kLockPath);
     kill(pid, SIGKILL);
     waitpid(pid, nullptr, 0);
-    EXPECT_TRUE(free) << "the program kept the lock through an inherited descriptor";
+    EXPECT_FALSE(held) << "the program kept the lock through an inherited descriptor";
 }
 
 TEST_F(ConfigTest, MissingDocumentIsTheFirstRunAndAnUnreadableOneFailsWithCode6)
@@ -309,6 +301,35 @@ TEST_F(ConfigTest, SaverKilledMidSaveLeavesACompleteDocument)
     TestDoc doc;
     ASSERT_TRUE(doc.Save());
     EXPECT_TRUE(TempFilesBesideDoc().empty()) << "temporaries of killed savers are swept";
+}
+
+TEST(JsonText, ReadsExactlyOneStrictJsonValue)
+{
+    const struct {
+        std::string text;
+        bool valid;
+    } cases[] = {
+        {"{\"a\":1}", true}, {" \n{\"a\":[1,2.5e-3,-0,true,false,null]}\r\n\t", true}, {"5", true}, {"[]", true},
+        {"\"top-level string\"", true}, {"\"\\u00e9\\n\\/\"", true},
+        {std::string(100, '[') + std::string(100, ']'), true},  // deep, within the limit
+        // Not one value, or not strict: comments, trailing commas, single quotes, bare names.
+        {"", false}, {"   ", false}, {"{\"a\":1} x", false}, {"{\"a\":1}{}", false}, {"{\"a\":1,}", false},
+        {"[1,]", false}, {"// comment\n{}", false}, {"{} /* comment */", false}, {"{'a':1}", false}, {"{1:2}", false},
+        {"{\"a\" 1}", false}, {"NaN", false}, {"tru", false},
+        // Numbers the JSON library would take on its own.
+        {"01", false}, {"1.", false}, {"-", false}, {".5", false}, {"1e", false}, {"+1", false},
+        // Strings: raw control characters, unknown or short escapes, no end.
+        {"\"raw\x01" "control\"", false}, {"\"bad \\x escape\"", false}, {"\"\\u12\"", false},
+        // Surrogate escapes only in pairs: an unpaired one would be decoded into a wrong character.
+        {"\"\\ud83d\\ude00\"", true}, {"\"\\ud800\\u0041\"", false}, {"\"\\ud800\"", false}, {"\"\\udc00\"", false},
+        {"\"\\ud800\\ud800\"", false},
+        {"\"unterminated", false},
+        {std::string(100000, '[') + std::string(100000, ']'), false},  // too deep: refused, not recursed into
+    };
+    for (const auto &c : cases) {
+        Json::Value value;
+        EXPECT_EQ(fromString(value, c.text), c.valid) << "text: " << c.text.substr(0, 40);
+    }
 }
 
 }  // namespace
