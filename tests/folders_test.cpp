@@ -1,5 +1,5 @@
-// The folder list: loading, merging settings with their change reports, removing, listing, and the
-// locked lookup of IndexMgr.
+// The folder list: loading, merging settings with their change reports, removing, listing, the
+// locked lookup of IndexMgr, and the paged listing with its sort orders and computed information.
 #include <memory>
 
 #include "fileindex/error.h"
@@ -40,7 +40,7 @@ protected:
     void SetUp() override
     {
         SandboxTest::SetUp();
-        DeclareShares("volume1/photo volume1/video volume1/video2 volume2/music");
+        DeclareShares("volume1/photo volume1/video volume1/video2 volume2/music volume1/ro+read_only");
         ErrorHandler::SetError(FILEIDX_ERR_NONE);
     }
 
@@ -57,33 +57,24 @@ protected:
     static Json::Value StoredDocument() { return ParseJson(ReadFile(kFolderConf)); }
 };
 
-TEST_F(FoldersTest, LoadMergesOnlyWellTypedKeysAndReloadStartsFromDefaults)
+// Load merges a record's well-typed members into what the folder holds and Reload starts from the
+// defaults. The full path is resolved at load; a folder whose share was not found logs when asked.
+TEST_F(FoldersTest, RecordLoadMergesWellTypedMembersAndReloadStartsFromDefaults)
 {
     Folder folder = MakeFolder("/photo/a", R"({"name":"a","video":true})");
     EXPECT_TRUE(folder.Load("/photo/a", ParseJson(R"({"path":"/ignored","name":5,"audio":true,"photo":1})")));
-    EXPECT_EQ(folder.m_path, "/photo/a");
-    EXPECT_EQ(folder.m_name, "a");
-    EXPECT_TRUE(folder.m_bAudio);
-    EXPECT_TRUE(folder.m_bVideo);
-    EXPECT_FALSE(folder.m_bPhoto);
-    EXPECT_EQ(folder.m_fullPath, HostPath("/volume1/photo/a"));
-
+    EXPECT_EQ(folder.asJson(),
+              ParseJson(R"({"path":"/photo/a","name":"a","document":false,"audio":true,"video":true,"photo":false})"));
     EXPECT_TRUE(folder.Reload("/photo/a", Json::Value(Json::objectValue)));
     EXPECT_EQ(folder.asJson(),
               ParseJson(R"({"path":"/photo/a","name":"","document":false,"audio":false,"video":false,"photo":false})"));
     EXPECT_FALSE(folder.Reload("/gone/a", Json::Value(Json::objectValue)));
-}
 
-TEST_F(FoldersTest, FullPathOfALoadedFolderIsCachedAndAFailedOneIsLogged)
-{
-    const Folder loaded = MakeFolder("/photo/a");
     SetFaults(ParseJson(R"({"VEXOShareGet": {"result": -1}})"));
-    EXPECT_EQ(loaded.GetFullPath(), HostPath("/volume1/photo/a"));
-    EXPECT_TRUE(LogCapture::Lines().empty());
-
-    const Folder orphan = MakeFolder("/photo/b");
-    EXPECT_EQ(orphan.GetFullPath(), "");
+    EXPECT_EQ(MakeFolder("/photo/b").GetFullPath(), "");
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to get full path from /photo/b"});
+    EXPECT_EQ(folder.GetFullPath(), HostPath("/volume1/photo/a"));
+    EXPECT_EQ(LogCapture::Messages().size(), 1u) << "a resolved folder asks nobody";
 }
 
 // A folder list that cannot be used fails the list with its code, and the queries answer no (0 from
@@ -117,35 +108,24 @@ TEST_F(FoldersTest, FolderListFileThatCannotBeUsedFailsWithItsCode)
     }
 }
 
+// A record of the wrong type loads as the defaults, one whose share is gone still loads, and both are
+// written back as full records; a second Load keeps the values of the first and adds new paths.
 TEST_F(FoldersTest, OddRecordsLoadAndAreWrittenBackAsFullRecords)
 {
-    WriteFile(kFolderConf,
-              R"({"/photo/str":"text","/gone/x":{"path":"/elsewhere","name":"x","audio":true,"extra":1}})");
+    WriteFile(kFolderConf, R"({"/photo/str":"text","/gone/x":{"path":"/elsewhere","name":"x","audio":true,"extra":1}})");
     Folders folders;
+    ASSERT_TRUE(folders.Load());
+    WriteFile(kFolderConf, R"({"/photo/str":{"name":"second"},"/photo/b":{}})");
     ASSERT_TRUE(folders.Load());
     std::vector<Folder> listed;
     ASSERT_TRUE(folders.List(listed));
-    ASSERT_EQ(listed.size(), 2u);
-    EXPECT_EQ(listed[0].m_path, "/gone/x");
-    EXPECT_EQ(listed[0].m_fullPath, "") << "a folder whose share is gone still loads";
-    EXPECT_TRUE(listed[0].m_bAudio);
+    ASSERT_EQ(listed.size(), 3u);
+    EXPECT_EQ(listed[0].m_path + " " + listed[0].m_fullPath, "/gone/x ");
     ASSERT_TRUE(folders.Save());
     EXPECT_EQ(StoredDocument(), ParseJson(R"({
         "/gone/x":{"path":"/gone/x","name":"x","document":false,"audio":true,"video":false,"photo":false},
+        "/photo/b":{"path":"/photo/b","name":"","document":false,"audio":false,"video":false,"photo":false},
         "/photo/str":{"path":"/photo/str","name":"","document":false,"audio":false,"video":false,"photo":false}})"));
-}
-
-TEST_F(FoldersTest, SecondLoadKeepsTheFirstValues)
-{
-    WriteFile(kFolderConf, R"({"/photo/a":{"name":"first"}})");
-    Folders folders;
-    ASSERT_TRUE(folders.Load());
-    WriteFile(kFolderConf, R"({"/photo/a":{"name":"second"},"/photo/b":{}})");
-    ASSERT_TRUE(folders.Load());
-    Json::Value record;
-    ASSERT_TRUE(folders.Get(record, "/photo/a"));
-    EXPECT_EQ(record["name"], "first");
-    EXPECT_TRUE(folders.Get(record, "/photo/b"));
 }
 
 // Steps into one list: a new path starts from defaults, a stored one keeps what the request leaves
@@ -361,6 +341,92 @@ TEST_F(FoldersTest, BytesThatAreNotUtf8SurviveUpsertSaveLoadAndGet)
     ASSERT_TRUE(IndexMgr::List(listed));
     ASSERT_EQ(listed.size(), 1u);
     EXPECT_EQ(listed[0].m_fullPath, HostPath("/volume1") + path);
+}
+
+class FolderListingTest : public FoldersTest {
+protected:
+    void SetUp() override
+    {
+        FoldersTest::SetUp();
+        stdfs::create_directories(SharePath("ro") + "/r");
+        // Byte order of the paths: Beta, Dog, alpha, cat, eel; ignoring case: alpha, Beta, cat, Dog, eel.
+        // Names ignoring case: Alpha (alpha), bravo (Dog), charlie (cat), delta (Beta), Echo (eel).
+        WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({
+            "/photo/Beta": {"name": "delta", "document": true, "audio": true},
+            "/photo/alpha": {"name": "Alpha", "video": true, "photo": true},
+            "/photo/cat": {"name": "charlie", "audio": true, "photo": true},
+            "/photo/Dog": {"name": "bravo", "document": true},
+            "/photo/eel": {"name": "Echo", "photo": true}})");
+    }
+};
+
+TEST_F(FolderListingTest, PagesFollowTheSortKeyAndDescendingIgnoresTheOffset)
+{
+    const struct {
+        unsigned long offset;
+        unsigned long limit;
+        const char *sortBy;
+        const char *direction;
+        const char *page;  // last path components, in page order
+    } cases[] = {
+        {0, 10, "path", "", "alpha Beta cat Dog eel"},
+        {0, 10, "Name", "", "alpha Beta cat Dog eel"},  // an unknown key sorts by path
+        {2, 2, "name", "ASC", "cat Beta"},
+        {2, 2, "name", "DESC", "Dog alpha"},  // the first two ascending, reversed
+        {0, 10, "name", "DESC", "eel Beta cat Dog alpha"},
+        {0, 10, "name", "desc", "alpha Dog cat Beta eel"},  // only "DESC" reverses
+        {4, 10, "name", "", "eel"},
+        {0, 0, "name", "", ""},
+        {5, 10, "name", "", ""},
+        {7, 10, "name", "DESC", ""},
+        // Flags: false before true; folders the flag does not tell apart stay in byte order.
+        {0, 10, "document", "", "alpha cat eel Beta Dog"},
+        {0, 10, "audio", "", "Dog alpha eel Beta cat"},
+        {0, 10, "video", "", "Beta Dog cat eel alpha"},
+        {0, 10, "photo", "", "Beta Dog alpha cat eel"},
+        {0, 10, "photo", "DESC", "eel cat alpha Dog Beta"},
+    };
+    for (const auto &c : cases) {
+        Json::Value out;
+        ASSERT_TRUE(IndexMgr::List(out, c.offset, c.limit, c.sortBy, c.direction, Json::Value(Json::arrayValue)));
+        std::string page;
+        for (const Json::Value &record : out["folder"]) {
+            page += (page.empty() ? "" : " ") + record["path"].asString().substr(7);
+            EXPECT_EQ(record["additional"], Json::Value(Json::objectValue));
+        }
+        EXPECT_EQ(page, c.page) << c.offset << " " << c.limit << " " << c.sortBy << " " << c.direction;
+        EXPECT_EQ(out["total"], 5u);
+        EXPECT_EQ(out["offset"], Json::UInt64(c.offset));
+    }
+    EXPECT_TRUE(LogCapture::Lines().empty());
+}
+
+TEST_F(FolderListingTest, UnknownAdditionalKeyBecomesNullWhileABadKeyListEmptiesAdditional)
+{
+    const struct {
+        const char *keys;
+        const char *additional;
+        std::vector<std::string> messages;
+    } cases[] = {
+        {R"(["status", "bogus", "is_valid"])", R"({"status": "paused", "bogus": null, "is_valid": false})",
+         {"Unknown additional: bogus", "Failed to get additional: bogus"}},
+        {R"("status")", "{}", {R"(Bad param: "status")", "GetAdditional failed"}},
+        {R"(["is_valid", 5, "status"])", R"({"is_valid": false})", {"Bad param: 5", "GetAdditional failed"}},
+    };
+    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/alpha": {}, "/ro/r": {"name": "r", "audio": true}})");
+    for (const auto &c : cases) {
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        Json::Value out;
+        ASSERT_TRUE(IndexMgr::List(out, 1, 1, "path", "", ParseJson(c.keys)));
+        Json::Value expected = ParseJson(R"({"path": "/ro/r", "name": "r", "document": false, "audio": true,
+                                             "video": false, "photo": false})");
+        expected["additional"] = ParseJson(c.additional);
+        ASSERT_EQ(out["folder"].size(), 1u);
+        EXPECT_EQ(out["folder"][0], expected) << c.keys;
+        EXPECT_EQ(LogCapture::Messages(), c.messages) << c.keys;
+        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_BAD_PARAM) << c.keys;
+    }
 }
 
 }  // namespace
