@@ -1,8 +1,6 @@
 // The index management operations end to end: what each one does to folder.conf, the platform (the
 // emulation's journal), the daemon (frames) and the event queues, in which order, and what a failure
 // leaves behind.
-#include <fcntl.h>
-#include <sys/file.h>
 #include <unistd.h>
 
 #include <functional>
@@ -66,14 +64,6 @@ std::string DescribeCommand(const std::string &frame)
         text += " " + key + "=" + Text(command["data"][key]);
     }
     return text;
-}
-
-bool FolderLockIsHeld()
-{
-    const int fd = open(FILEINDEX_FOLDER_LOCK_PATH, O_RDWR | O_CLOEXEC);
-    const bool held = fd >= 0 && flock(fd, LOCK_EX | LOCK_NB) != 0;
-    close(fd);
-    return held;
 }
 
 Lines Join(std::initializer_list<Lines> parts)
@@ -157,7 +147,7 @@ protected:
                 m_effects.push_back(DescribeCall(journal[call]));
             }
         }
-        EXPECT_FALSE(FolderLockIsHeld()) << "the folder lock must be released on every path";
+        EXPECT_FALSE(IsLockHeld(FILEINDEX_FOLDER_LOCK_PATH)) << "the folder lock must be released on every path";
         return result;
     }
 
