@@ -1,6 +1,7 @@
 // fileindexctl as a user runs it: a process, its standard output, standard error and exit status.
 #include <fcntl.h>
 #include <signal.h>
+#include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -18,22 +19,12 @@ namespace {
 
 const std::string kFolderConf = FILEINDEX_FOLDER_CONF_PATH;
 constexpr int kRunLimitMilliseconds = 20000;
-const std::string kStatusConf = FILEINDEX_STATUS_CONF_PATH;
 
 struct Outcome {
     int status;
     std::string out;
     std::string err;
 };
-
-std::string Describe(const std::vector<std::string> &args)
-{
-    std::string text = "fileindexctl";
-    for (const std::string &arg : args) {
-        text += " " + arg;
-    }
-    return text;
-}
 
 class FileindexctlTest : public SandboxTest {
 protected:
@@ -46,27 +37,23 @@ protected:
     // A stand-in daemon a test started through the service start does not outlive the test.
     void TearDown() override { VLIBServiceStop("fileindexd", 1); }
 
-    // Runs fileindexctl with args, its output and error streams going to files of the sandbox.
+    // Runs fileindexctl with args, its output and error streams going to files of the sandbox. A run
+    // that hangs is ended after a time limit, and then reads as killed.
     static Outcome Ctl(const std::vector<std::string> &args)
     {
-        const std::string out = HostPath("/ctl.out");
-        const std::string err = HostPath("/ctl.err");
-        const pid_t pid = fork();
-        if (pid == 0) {
-            std::vector<char *> argv{const_cast<char *>(FILEINDEXCTL)};
-            for (const std::string &arg : args) {
-                argv.push_back(const_cast<char *>(arg.c_str()));
-            }
-            argv.push_back(nullptr);
-            const int outFd = open(out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-            const int errFd = open(err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-            if (outFd < 0 || errFd < 0 || dup2(outFd, STDOUT_FILENO) < 0 || dup2(errFd, STDERR_FILENO) < 0) {
-                _exit(127);
-            }
-            execv(FILEINDEXCTL, argv.data());
-            _exit(127);
+        const std::string out = HostPath("/ctl.out"), err = HostPath("/ctl.err");
+        std::vector<char *> argv{const_cast<char *>(FILEINDEXCTL)};
+        for (const std::string &arg : args) {
+            argv.push_back(const_cast<char *>(arg.c_str()));
         }
-        // A run that hangs is ended after a time limit, and then reads as killed.
+        argv.push_back(nullptr);
+        posix_spawn_file_actions_t files;
+        posix_spawn_file_actions_init(&files);
+        posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        posix_spawn_file_actions_addopen(&files, STDERR_FILENO, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        pid_t pid = -1;
+        EXPECT_EQ(posix_spawn(&pid, FILEINDEXCTL, &files, nullptr, argv.data(), environ), 0);
+        posix_spawn_file_actions_destroy(&files);
         int status = 0;
         for (int waited = 0; waitpid(pid, &status, WNOHANG) == 0; ++waited) {
             if (waited == kRunLimitMilliseconds / 10) {
@@ -111,7 +98,7 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
             holder = std::make_unique<LockHolder>(FILEINDEX_FOLDER_LOCK_PATH, true);
         }
         const Outcome outcome = Ctl(row.args);
-        SCOPED_TRACE(Describe(row.args));
+        SCOPED_TRACE(row.line);
         EXPECT_EQ(outcome.status, 1);
         EXPECT_EQ(outcome.out, "");
         EXPECT_TRUE(std::regex_match(outcome.err, std::regex(row.line + "\n"))) << outcome.err;

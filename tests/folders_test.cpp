@@ -322,21 +322,11 @@ TEST_F(FoldersTest, GoverningSettingIsTheLastMatchInListOrderNotTheInnermost)
 TEST_F(FoldersTest, BytesThatAreNotUtf8SurviveUpsertSaveLoadAndGet)
 {
     const std::string path = "/photo/caf\xe9/\xff\"q\\\x1f";
-    const std::string name = "n\xfe\x80";
-    Json::Value request;
-    request["path"] = path;
-    request["name"] = name;
-    request["video"] = true;
-    Folders folders;
-    ASSERT_TRUE(folders.Load());
-    Json::Value report;
-    ASSERT_TRUE(folders.Upsert(report, request));
-    ASSERT_TRUE(folders.Save());
-
+    UpsertAndSave("{\"path\":\"/photo/caf\xe9/\xff\\\"q\\\\\\u001f\",\"name\":\"n\xfe\x80\",\"video\":true}");
     Json::Value record;
     ASSERT_TRUE(IndexMgr::Get(record, path));
     EXPECT_EQ(record["path"].asString(), path);
-    EXPECT_EQ(record["name"].asString(), name);
+    EXPECT_EQ(record["name"].asString(), "n\xfe\x80");
     std::vector<Folder> listed;
     ASSERT_TRUE(IndexMgr::List(listed));
     ASSERT_EQ(listed.size(), 1u);
