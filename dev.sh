@@ -7,11 +7,13 @@
 #   ./dev.sh package                   build the Debian packages into build/dev/packages and check them
 #   ./dev.sh fuzz [--werror]           build the fuzz targets with clang and run each on a fixed
 #                                      number of inputs from its seeds in fuzz/corpus
+#   ./dev.sh bench [repetitions]       optimised build, run the benchmarks, print the table of
+#                                      docs/performance.md
 set -euo pipefail
 cd "$(dirname "$0")"
 
 packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev
-          help2man dpkg-dev file)
+          help2man dpkg-dev file libbenchmark-dev jq)
 # Added for the fuzz targets: clang and its fuzzer and sanitizer runtimes.
 fuzz_packages=(clang libclang-rt-dev)
 
@@ -99,8 +101,12 @@ fuzz)
     build fuzz -DFILEINDEX_WERROR="$werror"
     run_fuzzers
     ;;
+bench)
+    install_missing_packages
+    bench/run.sh "$@"
+    ;;
 *)
-    sed -n '2,9p' "$0" | sed 's/^# \{0,1\}//'
+    sed -n '2,11p' "$0" | sed 's/^# \{0,1\}//'
     exit 2
     ;;
 esac

@@ -1,0 +1,47 @@
+#!/usr/bin/env bash
+# Builds the benchmarks optimised (preset bench), runs each program with its benchmarks and their
+# baseline interleaved in one run, and prints the table of docs/performance.md: the median time of
+# each benchmark, the median of its baseline, their ratio (ours ÷ baseline) and the goal.
+#
+#   bench/run.sh [repetitions]      (default 7; ./dev.sh bench runs this)
+#
+# Times are CPU times of the benchmark's thread, which the load of other processes on the machine
+# barely changes; the upsert, which waits for the stand-in daemon, is wall-clock time.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+repetitions=${1:-7}
+
+cmake --preset bench >/dev/null
+cmake --build --preset bench >/dev/null
+results=$(mktemp -d)
+trap 'rm -rf "$results"' EXIT
+
+load_before=$(cut -d' ' -f1-3 /proc/loadavg)
+for program in build/bench/bench/fileindex_bench_*; do
+    "$program" --benchmark_repetitions="$repetitions" --benchmark_enable_random_interleaving=true \
+        --benchmark_report_aggregates_only=true --benchmark_format=json >"$results/${program##*/}.json"
+done
+load_after=$(cut -d' ' -f1-3 /proc/loadavg)
+
+echo "Machine: $(lscpu | sed -n 's/^Model name: *//p'), $(nproc) cores, $(uname -sr); load average $load_before before, $load_after after"
+echo "Command: bench/run.sh $repetitions (medians of $repetitions repetitions)"
+echo
+echo "| Goal | Benchmark | Ours | Baseline | Ours ÷ baseline | Met |"
+echo "|---|---|---|---|---|---|"
+jq -rs '
+  def goal: {"P1": 0.5, "P2": 2.5, "P3": 2.0};
+  def ms: . * 100 | round / 100 | tostring + " ms";
+  [.[].benchmarks[] | select(.aggregate_name == "median")] | sort_by(.run_name) as $runs
+  | ($runs | map(select(.run_name | test("/baseline:"))) | map({key: (.run_name | split("/")[0]), value: .}) | from_entries) as $baselines
+  | $runs[] | select(.run_name | test("/baseline:") | not)
+  | (.run_name | split("/")[0]) as $target
+  | if $target == "P4" then
+      "| P4 under 1 s | \(.run_name) | \(.real_time | ms) (wall) | | | \(if .real_time < 1000 then "yes" else "no" end) |"
+    else
+      (.cpu_time / $baselines[$target].cpu_time) as $ratio
+      | "| \($target) at most \(goal[$target])× | \(.run_name) | \(.cpu_time | ms) | \($baselines[$target].run_name | split(":")[1]) \($baselines[$target].cpu_time | ms) | \($ratio * 100 | round / 100) | \(if $ratio <= goal[$target] then "yes" else "no" end) |",
+        (if .peak_growth_KiB != null then
+           "| P5 a few MB at most | \(.run_name): peak memory growth | \(.peak_growth_KiB) KiB | getline \($baselines[$target].peak_growth_KiB) KiB | | \(if .peak_growth_KiB <= 4096 then "yes" else "no" end) |"
+         else empty end)
+    end
+' "$results"/*.json
