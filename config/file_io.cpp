@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <cstring>
 #include <ctime>
+#include <memory>
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -19,6 +20,9 @@ namespace {
 const char kTempInfix[] = ".tmp.";
 // No save takes this long: a temporary file this old is an orphan whatever its process number says.
 constexpr time_t kOrphanAge = 3600;
+
+// ForEachLine reads this much at a time, and more only for a line that does not fit.
+constexpr size_t kLineBlockSize = 256 * 1024;
 
 void SplitPath(const std::string &path, std::string &dir, std::string &name)
 {
@@ -200,16 +204,23 @@ bool AppendLine(int fd, const std::string &line, size_t &written)
     return false;
 }
 
-bool ForEachLine(const std::string &path, const std::function<bool(const std::string &line)> &visit)
+bool ForEachLine(const std::string &path, const std::function<bool(std::string_view line)> &visit)
 {
     const int fd = OpenRegularFile(path, O_RDONLY);
     if (fd < 0) {
         return false;
     }
-    std::string pending;
-    char buffer[65536];
+    size_t capacity = kLineBlockSize;
+    std::unique_ptr<char[]> block(new char[capacity]);
+    size_t kept = 0;  // the start of a line whose end has not been read yet
     for (;;) {
-        const ssize_t got = read(fd, buffer, sizeof(buffer));
+        if (kept == capacity) {
+            std::unique_ptr<char[]> larger(new char[capacity * 2]);
+            memcpy(larger.get(), block.get(), kept);
+            block = std::move(larger);
+            capacity *= 2;
+        }
+        const ssize_t got = read(fd, block.get() + kept, capacity - kept);
         if (got < 0 && errno == EINTR) {
             continue;
         }
@@ -220,19 +231,22 @@ bool ForEachLine(const std::string &path, const std::function<bool(const std::st
         if (got == 0) {
             break;
         }
-        pending.append(buffer, static_cast<size_t>(got));
-        size_t start = 0;
-        for (size_t newline; (newline = pending.find('\n', start)) != std::string::npos; start = newline + 1) {
-            if (!visit(pending.substr(start, newline - start))) {
+        const char *line = block.get();
+        const char *const end = line + kept + got;
+        const char *search = line + kept;  // the kept start holds no newline
+        while (const char *newline = static_cast<const char *>(memchr(search, '\n', end - search))) {
+            if (!visit(std::string_view(line, static_cast<size_t>(newline - line)))) {
                 close(fd);
                 return true;
             }
+            line = search = newline + 1;
         }
-        pending.erase(0, start);
+        kept = static_cast<size_t>(end - line);
+        memmove(block.get(), line, kept);
     }
     close(fd);
-    if (!pending.empty()) {
-        visit(pending);
+    if (kept > 0) {
+        visit(std::string_view(block.get(), kept));
     }
     return true;
 }

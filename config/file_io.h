@@ -6,6 +6,7 @@
 
 #include <functional>
 #include <string>
+#include <string_view>
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -26,8 +27,10 @@ int MakeDirectory(const std::string &path, mode_t mode);
 
 // Calls visit with each newline-separated line of the file (without its newline; a last line
 // without one included) until visit returns false. The file is opened with OpenRegularFile.
-// False when it cannot be opened or read.
-bool ForEachLine(const std::string &path, const std::function<bool(const std::string &line)> &visit);
+// False when it cannot be opened or read. Reads in large blocks and hands each line out where it
+// lies in the block, valid during the call only; memory follows the longest line, not the size of
+// the file.
+bool ForEachLine(const std::string &path, const std::function<bool(std::string_view line)> &visit);
 
 // Appends line, which ends in a newline, to the file fd (opened for reading and appending, and
 // locked by the caller) whole or not at all. When the file does not end in a newline (a writer was

@@ -5,14 +5,128 @@
 #include <json/value.h>
 
 #include "config/json_io.h"
+#include "config/json_token.h"
 
 namespace VEXO {
 namespace FILEINDEX {
 
-bool ParseQueueRecord(const std::string &line, QueueRecord &record)
+namespace {
+
+// One member of the top-level object, as the text has it; the last of several with one name wins,
+// as in the JSON library.
+struct MemberText {
+    bool present = false;
+    JsonToken token = JsonToken::kNull;
+    const char *begin = nullptr;
+    const char *end = nullptr;
+    bool escaped = false;
+};
+
+// Collects "event", "path" and "path_old" of the top-level object while the grammar is checked.
+class RecordMembers {
+public:
+    void Key(int depth, const char *begin, const char *end, bool escaped)
+    {
+        m_text.See(JsonToken::kString, begin, end, escaped);
+        if (depth != 1) {
+            return;
+        }
+        std::string_view name(begin, static_cast<size_t>(end - begin));
+        if (escaped) {
+            DecodeJsonString(begin, end, m_name);  // a refusal is already in m_text
+            name = m_name;
+        }
+        m_current = name == "event" ? &m_event : name == "path" ? &m_path : name == "path_old" ? &m_pathOld : nullptr;
+    }
+
+    void Value(int depth, JsonToken token, const char *begin, const char *end, bool escaped)
+    {
+        m_text.See(token, begin, end, escaped);
+        if (depth == 0) {
+            m_isObject = token == JsonToken::kObject;
+        } else if (depth == 1 && m_current != nullptr) {
+            *m_current = MemberText{true, token, begin, end, escaped};
+        }
+    }
+
+    bool NeedsJsonLibrary() const { return m_text.Seen(); }
+
+    // The record the members make; false when they make none.
+    bool Fill(QueueRecord &record) const
+    {
+        if (!m_isObject || !m_event.present || !ReadEvent(record.event) || !ReadString(m_path, record.path)) {
+            return false;
+        }
+        if (record.event != kEventMove || !ReadString(m_pathOld, record.pathOld)) {
+            record.pathOld.clear();
+        }
+        return true;
+    }
+
+private:
+    // What the JSON library converts to an unsigned integer: an integer from 0 to 4294967295 (-0
+    // included), true, false and null.
+    bool ReadEvent(unsigned &event) const
+    {
+        int64_t value = 0;
+        switch (m_event.token) {
+        case JsonToken::kNumber:
+            if (!ReadPlainJsonInteger(m_event.begin, m_event.end, value) || value < 0 || value > 0xFFFFFFFFLL) {
+                return false;
+            }
+            event = static_cast<unsigned>(value);
+            return true;
+        case JsonToken::kTrue:
+            event = 1;
+            return true;
+        case JsonToken::kFalse:
+        case JsonToken::kNull:
+            event = 0;
+            return true;
+        default:
+            return false;
+        }
+    }
+
+    static bool ReadString(const MemberText &member, std::string &out)
+    {
+        if (!member.present || member.token != JsonToken::kString) {
+            return false;
+        }
+        if (member.escaped) {
+            return DecodeJsonString(member.begin, member.end, out);
+        }
+        out.assign(member.begin, member.end);
+        return true;
+    }
+
+    LibraryOnlyText m_text;
+    std::string m_name;
+    bool m_isObject = false;
+    MemberText m_event;
+    MemberText m_path;
+    MemberText m_pathOld;
+    MemberText *m_current = nullptr;
+};
+
+}  // namespace
+
+bool ParseQueueRecord(std::string_view line, QueueRecord &record)
+{
+    RecordMembers members;
+    if (!ScanJsonText(line.data(), line.size(), members)) {
+        return false;  // fromString refuses what the grammar refuses
+    }
+    if (members.NeedsJsonLibrary()) {
+        return ParseQueueRecordAsJsonValue(line, record);
+    }
+    return members.Fill(record);
+}
+
+bool ParseQueueRecordAsJsonValue(std::string_view line, QueueRecord &record)
 {
     Json::Value value;
-    if (!fromString(value, line) || !value.isObject()) {
+    if (!fromString(value, std::string(line)) || !value.isObject()) {
         return false;
     }
     const auto member = [&value](const char *key) { return value.find(key, key + strlen(key)); };

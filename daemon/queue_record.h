@@ -5,6 +5,7 @@
 #define FILEINDEX_DAEMON_QUEUE_RECORD_H
 
 #include <string>
+#include <string_view>
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -20,10 +21,15 @@ struct QueueRecord {
     std::string pathOld;  // "path_old" of a move when it is a string; empty otherwise
 };
 
-// True when line is one JSON object with an "event" the JSON library can convert to an unsigned
-// integer and a string "path"; record is then filled. False for anything else (a line being
-// appended, a foreign record), record unspecified.
-bool ParseQueueRecord(const std::string &line, QueueRecord &record);
+// True when line is one JSON object (fromString) with an "event" the JSON library can convert to an
+// unsigned integer and a string "path"; record is then filled. False for anything else (a line
+// being appended, a foreign record), record unspecified. Reads the members straight from the
+// text, and hands the rare line whose judgement needs the JSON library to
+// ParseQueueRecordAsJsonValue.
+bool ParseQueueRecord(std::string_view line, QueueRecord &record);
+
+// The same judgement made on the line's Json::Value.
+bool ParseQueueRecordAsJsonValue(std::string_view line, QueueRecord &record);
 
 }  // namespace FILEINDEX
 }  // namespace VEXO

@@ -80,8 +80,8 @@ bool HasQueuedReindexEvent(const std::string &path, const std::string &queueFile
         return false;
     }
     bool found = false;
-    const bool read = ForEachLine(queueFile, [&](const std::string &line) {
-        QueueRecord record;
+    QueueRecord record;
+    const bool read = ForEachLine(queueFile, [&](std::string_view line) {
         found = ParseQueueRecord(line, record) && record.event == kEventReindex && record.path == path;
         return !found;
     });

@@ -89,10 +89,10 @@ bool HasPendingEventForFolder(const std::string &path, const std::string &queueF
     }
     const std::string folder = fullPath + "/";
     bool found = false;
-    const bool read = ForEachLine(queueFile, [&](const std::string &line) {
-        QueueRecord record;
+    QueueRecord record;
+    const bool read = ForEachLine(queueFile, [&](std::string_view line) {
         if (!ParseQueueRecord(line, record)) {
-            FILEIDX_LOG("%s:%d Malformed command: %s", line.c_str());
+            FILEIDX_LOG("%s:%d Malformed command: %s", std::string(line).c_str());
             return true;
         }
         // pathOld is set for moves only.

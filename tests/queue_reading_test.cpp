@@ -1,0 +1,123 @@
+// Queue files read fast: every line judged as the JSON library judges it, and lines found whole
+// across the reader's blocks.
+#include "config/json_io.h"
+#include "daemon/event_queue.h"
+#include "daemon/queue_record.h"
+#include "fileindex/status.h"
+#include "share/storage_paths.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/sandbox.h"
+
+using namespace VEXO::FILEINDEX;
+
+namespace fileindex_test {
+namespace {
+
+TEST(QueueLineTest, TextReaderJudgesEveryLineAsTheJsonLibraryDoes)
+{
+    const struct {
+        std::string line;
+        bool record;
+        unsigned event;
+        std::string path;
+        std::string pathOld;
+    } cases[] = {
+        {R"({"event":65536,"path":"/v/a"})", true, 65536, "/v/a", ""},
+        {R"( { "event" : 256 , "path":"/v/b", "path_old":"/v/a" } )", true, 256, "/v/b", "/v/a"},
+        {R"({"event":2,"path":"/v/b","path_old":"/v/a"})", true, 2, "/v/b", ""},
+        {R"({"event":256,"path":"/v/b","path_old":7})", true, 256, "/v/b", ""},
+        {R"({"event":6.5536e4,"path":"/v/a"})", true, 65536, "/v/a", ""},
+        {R"({"event":65536.9,"path":"/v/a"})", true, 65536, "/v/a", ""},
+        {R"({"event":-0,"path":"/v/a"})", true, 0, "/v/a", ""},
+        {R"({"event":4294967295,"path":"/v/a"})", true, 4294967295u, "/v/a", ""},
+        {R"({"event":true,"path":"/v/a"})", true, 1, "/v/a", ""},
+        {R"({"event":null,"path":"/v/a"})", true, 0, "/v/a", ""},
+        {R"({"event":"x","event":1,"path":"/v/a"})", true, 1, "/v/a", ""},
+        {R"({"event":1,"p\u0061th":"\/v\/caf\u00e9\"\\\t"})", true, 1, "/v/caf\xc3\xa9\"\\\t", ""},
+        {"{\"event\":1,\"path\":\"/v/caf\xe9\"}", true, 1, "/v/caf\xe9", ""},
+        {R"({"event":1,"path":"/v/\ud83d\ude00"})", true, 1, "/v/\xf0\x9f\x98\x80", ""},
+        {R"({"event":1,"path":"/v/a","data":[1.5,-2e-3,{"d":{"e":[]}}]})", true, 1, "/v/a", ""},
+        {R"({"event":-1,"path":"/v/a"})", false, 0, "", ""},
+        {R"({"event":4294967296,"path":"/v/a"})", false, 0, "", ""},
+        {R"({"event":"65536","path":"/v/a"})", false, 0, "", ""},
+        {R"({"event":1,"path":"/v/a","event":[1]})", false, 0, "", ""},
+        {R"({"event":1,"path\u0000":"/v/a"})", false, 0, "", ""},
+        {R"({"event":1,"path":"/v/\ud800"})", false, 0, "", ""},
+        {R"({"event":1,"path":"/v/a","data":1e400})", false, 0, "", ""},
+        {"{\"event\":1,\"path\":\"/v/\ta\"}", false, 0, "", ""},
+        {R"({"event":01,"path":"/v/a"})", false, 0, "", ""},
+        {R"({"event":1,"path":"/v/a"} x)", false, 0, "", ""},
+        {R"({"event":1,"path":"/v/a")", false, 0, "", ""},
+        {R"([{"event":1,"path":"/v/a"}])", false, 0, "", ""},
+        {"", false, 0, "", ""},
+    };
+    for (const auto &c : cases) {
+        for (const auto parse : {ParseQueueRecord, ParseQueueRecordAsJsonValue}) {
+            QueueRecord record;
+            ASSERT_EQ(parse(c.line, record), c.record) << c.line;
+            if (c.record) {
+                EXPECT_EQ(record.event, c.event) << c.line;
+                EXPECT_EQ(record.path, c.path) << c.line;
+                EXPECT_EQ(record.pathOld, c.pathOld) << c.line;
+            }
+        }
+    }
+}
+
+class QueueScanTest : public SandboxTest {
+protected:
+    void SetUp() override
+    {
+        SandboxTest::SetUp();
+        DeclareShares("volume1/photo");
+        for (const char *folder : {"a", "b", "caf\xe9"}) {
+            stdfs::create_directories(SharePath("photo") + "/" + folder);
+        }
+        stdfs::create_directories(MetadataDirPath(SharePath("photo")));
+        m_queue = StoragePath(SharePath("photo"), kQueueFileName);
+    }
+
+    // A record of an event on the entry at path inside the share.
+    static std::string Event(const std::string &path, unsigned event = 2)
+    {
+        Json::Value record;
+        record["event"] = event;
+        record["path"] = SharePath("photo") + path;
+        return toString(record) + "\n";
+    }
+
+    std::string m_queue;
+};
+
+// Lines cross the reader's blocks of 256 KiB, and one is longer than a block: each must still be
+// judged whole, or a record turns into two malformed lines.
+TEST_F(QueueScanTest, LongQueueIsJudgedLineByLine)
+{
+    std::string queue;
+    while (queue.size() < 400 * 1024) {
+        queue += Event("/d/" + std::to_string(queue.size()));
+    }
+    queue += "{\"event\":1,\"path\":\"" + SharePath("photo") + "/a/" + std::string(300 * 1024, 'x') + "\"}\n";
+    queue += "{\"event\":1,\n";
+    queue += R"({"event":6.5536e4,"path":")" + SharePath("photo") + R"(\/caf\u00e9"})" "\n";
+    queue += Event("/caf\xe9/p.jpg") + Event("/d/last");
+    WriteFile(m_queue, queue);
+
+    EXPECT_TRUE(HasQueuedReindexEvent(SharePath("photo") + "/caf\xc3\xa9", m_queue));
+    EXPECT_FALSE(HasQueuedReindexEvent(SharePath("photo") + "/caf\xe9", m_queue));
+    EXPECT_TRUE(LogCapture::Lines().empty());
+    const struct {
+        const char *folder;
+        const char *word;
+        size_t malformed;  // lines logged before the folder's first event
+    } cases[] = {{"/photo/a", "processing", 0}, {"/photo/caf\xe9", "processing", 1}, {"/photo/b", "finished", 1}};
+    for (const auto &c : cases) {
+        LogCapture::Clear();
+        EXPECT_EQ(StatusMgr::GetFolderStatus(c.folder), c.word) << c.folder;
+        EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>(c.malformed, "Malformed command: {\"event\":1,"))
+            << c.folder;
+    }
+}
+
+}  // namespace
+}  // namespace fileindex_test
