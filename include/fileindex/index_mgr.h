@@ -19,6 +19,7 @@ public:
 
     // All folder settings, in path order, read without the folder lock (a concurrent writer's save
     // is seen either whole or not at all). False with error 6 or 8 when folder.conf is unreadable.
+    // Each share is looked up in the share database once per call, not once per folder.
     static bool List(std::vector<Folder> &out);
     // A sorted page of the folder list with computed information, as Folders::List of the same form
     // (see folder.h), read without the folder lock. False, out untouched, with error 6 or 8 when
