@@ -1,6 +1,7 @@
 #include "fileindex/folder.h"
 
 #include <algorithm>
+#include <iterator>
 
 #include "appliance_paths.h"
 #include "config/json_io.h"
@@ -9,6 +10,7 @@
 #include "fileindex/utils.h"
 #include "folder/change_report.h"
 #include "platform/unicode.h"
+#include "status/folder_events.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -182,16 +184,18 @@ bool Folders::List(Json::Value &out, unsigned long offset, unsigned long limit, 
     std::stable_sort(sorted.begin(), sorted.end(), CompareFolder(sort_by));
 
     const unsigned long count = offset >= sorted.size() ? 0 : std::min<unsigned long>(sorted.size() - offset, limit);
+    // A descending page is the first count folders of the ascending order, reversed: the offset is
+    // not applied.
+    const bool descending = sort_direction == "DESC";
+    const auto first = sorted.begin() + static_cast<long>(descending || count == 0 ? 0 : offset);
+    std::vector<std::string> fullPaths;
+    std::transform(first, first + static_cast<long>(count), std::back_inserter(fullPaths),
+                   [](const Folder &folder) { return folder.m_fullPath; });
+    // Each folder's "status" searches its share's queue files: one reading of each serves the page.
+    const OneQueueReadingPerCall queueReading(std::move(fullPaths));
     Json::Value page(Json::arrayValue);
-    if (sort_direction == "DESC") {
-        // The first count folders of the ascending order, reversed; the offset is not applied.
-        for (unsigned long i = count; i-- > 0;) {
-            page.append(sorted[i].asJson(additional));
-        }
-    } else {
-        for (unsigned long i = 0; i < count; ++i) {
-            page.append(sorted[offset + i].asJson(additional));
-        }
+    for (unsigned long i = 0; i < count; ++i) {
+        page.append(first[static_cast<long>(descending ? count - 1 - i : i)].asJson(additional));
     }
     out["folder"] = page;
     return true;

@@ -3,16 +3,15 @@
 #include <functional>
 #include <set>
 
-#include "config/file_io.h"
 #include "config/log.h"
 #include "config/unlock_on_return.h"
-#include "daemon/queue_record.h"
 #include "fileindex/error.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
+#include "status/folder_events.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -87,18 +86,10 @@ bool HasPendingEventForFolder(const std::string &path, const std::string &queueF
         FILEIDX_LOG("%s:%d Cannot get full path: %s", path.c_str());
         return false;
     }
-    const std::string folder = fullPath + "/";
     bool found = false;
-    QueueRecord record;
-    const bool read = ForEachLine(queueFile, [&](std::string_view line) {
-        if (!ParseQueueRecord(line, record)) {
-            FILEIDX_LOG("%s:%d Malformed command: %s", std::string(line).c_str());
-            return true;
-        }
-        // pathOld is set for moves only.
-        found = StringStartWith(record.path + "/", folder) || StringStartWith(record.pathOld + "/", folder);
-        return !found;
-    });
+    const bool read = FindEventInFolder(queueFile, fullPath, [](std::string_view line) {
+        FILEIDX_LOG("%s:%d Malformed command: %s", std::string(line).c_str());
+    }, found);
     if (!read) {
         FILEIDX_LOG("%s:%d Failed to open queue=%s, reason=%m", queueFile.c_str());
     }

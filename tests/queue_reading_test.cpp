@@ -1,8 +1,12 @@
-// Queue files read fast: every line judged as the JSON library judges it, and lines found whole
-// across the reader's blocks.
+// Queue files read fast: every line judged as the JSON library judges it, lines found whole across
+// the reader's blocks, and a listing that reads each queue once reporting exactly what each folder's
+// own search reports, malformed lines included.
+#include <cstdio>
+
 #include "config/json_io.h"
 #include "daemon/event_queue.h"
 #include "daemon/queue_record.h"
+#include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
 #include "share/storage_paths.h"
 #include "tests/support/log_capture.h"
@@ -70,7 +74,7 @@ protected:
     {
         SandboxTest::SetUp();
         DeclareShares("volume1/photo");
-        for (const char *folder : {"a", "b", "caf\xe9"}) {
+        for (const char *folder : {"a", "b", "c", "d", "caf\xe9"}) {
             stdfs::create_directories(SharePath("photo") + "/" + folder);
         }
         stdfs::create_directories(MetadataDirPath(SharePath("photo")));
@@ -116,6 +120,51 @@ TEST_F(QueueScanTest, LongQueueIsJudgedLineByLine)
         EXPECT_EQ(StatusMgr::GetFolderStatus(c.folder), c.word) << c.folder;
         EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>(c.malformed, "Malformed command: {\"event\":1,"))
             << c.folder;
+    }
+}
+
+// The listing reads each queue file once for all its folders; each folder's status and the lines
+// logged for it must be what asking for that folder alone gives, in the listing's order.
+TEST_F(QueueScanTest, ListingReportsEachFolderAsItsOwnSearchWould)
+{
+    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/a":{},"/photo/b":{},"/photo/c":{},"/photo/d":{},"/photo/e":{}})");
+    const std::string companion = QueueCompanionPath(m_queue);
+    WriteFile(companion, "not json\n" + Event("/c/x"));
+    const std::string manyMalformed = [] {
+        std::string lines;
+        while (lines.size() <= 1024 * 1024) {
+            lines += "{\"half\":\"" + std::string(1000, 'x') + "\n";
+        }
+        return lines;
+    }();
+    const std::string queues[] = {
+        "[1]\n" + Event("/b/x") + "{\"event\":1,\n" + Event("/a/y", 256) + Event("/d", 65536) + "{}\n",
+        Event("/e/z") + "{\"event\":\n",  // the file replaced between two listings
+        manyMalformed + Event("/a/x") + "{\n",
+    };
+    Json::Value additional(Json::arrayValue);
+    additional.append("status");
+    for (const std::string &content : queues) {
+        const std::string replacement = m_queue + ".new";
+        WriteFile(replacement, content);
+        ASSERT_EQ(rename(replacement.c_str(), m_queue.c_str()), 0);
+        std::vector<std::string> words;
+        std::vector<std::string> messages;
+        for (const char *folder : {"/photo/a", "/photo/b", "/photo/c", "/photo/d", "/photo/e"}) {
+            LogCapture::Clear();
+            words.push_back(StatusMgr::GetFolderStatus(folder));
+            const std::vector<std::string> own = LogCapture::Messages();
+            messages.insert(messages.end(), own.begin(), own.end());
+        }
+        LogCapture::Clear();
+        Json::Value page;
+        ASSERT_TRUE(IndexMgr::List(page, 0, 10, "path", "", additional));
+        ASSERT_EQ(page["folder"].size(), words.size());
+        for (Json::ArrayIndex i = 0; i < page["folder"].size(); ++i) {
+            EXPECT_EQ(page["folder"][i]["additional"]["status"].asString(), words[i]) << i << " " << content.size();
+        }
+        EXPECT_EQ(LogCapture::Messages(), messages) << content.size();
+        EXPECT_GT(messages.size(), 1u) << "each queue holds malformed lines";
     }
 }
 

@@ -1,0 +1,169 @@
+#include "status/folder_events.h"
+
+#include <algorithm>
+#include <map>
+#include <unordered_map>
+#include <utility>
+
+#include "config/file_io.h"
+#include "daemon/queue_record.h"
+
+namespace VEXO {
+namespace FILEINDEX {
+
+namespace {
+
+constexpr size_t kNoEvent = static_cast<size_t>(-1);
+constexpr size_t kMaxKeptMalformedBytes = 1024 * 1024;
+
+thread_local OneQueueReadingPerCall::Readings *t_readings = nullptr;
+
+// path + "/" begins with folder + "/".
+bool IsInside(const std::string &path, std::string_view folder)
+{
+    return path.size() >= folder.size() && path.compare(0, folder.size(), folder) == 0 &&
+           (path.size() == folder.size() || path[folder.size()] == '/');
+}
+
+}  // namespace
+
+// What one reading of a queue file found for the folders of a OneQueueReadingPerCall.
+struct FileReading {
+    bool usable = false;
+    std::vector<size_t> firstEvent;                          // per folder: the line of its first event
+    std::vector<std::pair<size_t, std::string>> malformed;  // line and text, in file order
+};
+
+class OneQueueReadingPerCall::Readings {
+public:
+    explicit Readings(std::vector<std::string> folders) : m_folders(std::move(folders)) {}
+
+    // The answer of the file's one reading for folder; false when there is none to give.
+    bool Answer(const std::string &queueFile, const std::string &folder,
+                const std::function<void(std::string_view line)> &malformed, bool &found)
+    {
+        if (!m_indexed) {
+            Index();
+        }
+        const auto entry = m_index.find(folder);
+        if (entry == m_index.end()) {
+            return false;
+        }
+        auto reading = m_files.find(queueFile);
+        if (reading == m_files.end()) {
+            reading = m_files.emplace(queueFile, Read(queueFile)).first;
+        }
+        if (!reading->second.usable) {
+            return false;
+        }
+        const size_t first = reading->second.firstEvent[entry->second];
+        for (const auto &line : reading->second.malformed) {
+            if (line.first >= first) {
+                break;
+            }
+            malformed(line.second);
+        }
+        found = first != kNoEvent;
+        return true;
+    }
+
+private:
+    // Indexes the folders by their text, once a question is asked: most listings ask none.
+    void Index()
+    {
+        m_folders.erase(std::remove(m_folders.begin(), m_folders.end(), std::string()), m_folders.end());
+        std::sort(m_folders.begin(), m_folders.end());
+        m_folders.erase(std::unique(m_folders.begin(), m_folders.end()), m_folders.end());
+        for (size_t i = 0; i < m_folders.size(); ++i) {
+            m_index.emplace(m_folders[i], i);
+            m_lengths.push_back(m_folders[i].size());
+        }
+        std::sort(m_lengths.begin(), m_lengths.end());
+        m_lengths.erase(std::unique(m_lengths.begin(), m_lengths.end()), m_lengths.end());
+        m_indexed = true;
+    }
+
+    // Reads the file until every folder has its first event: a malformed line after all of them
+    // concerns none.
+    FileReading Read(const std::string &queueFile) const
+    {
+        FileReading reading;
+        reading.firstEvent.assign(m_folders.size(), kNoEvent);
+        size_t waiting = m_folders.size();
+        size_t number = 0;
+        size_t keptBytes = 0;
+        QueueRecord record;
+        const auto mark = [&](const std::string &path) {
+            for (const size_t length : m_lengths) {
+                if (length > path.size()) {
+                    break;
+                }
+                if (length < path.size() && path[length] != '/') {
+                    continue;
+                }
+                const auto folder = m_index.find(std::string_view(path.data(), length));
+                if (folder != m_index.end() && reading.firstEvent[folder->second] == kNoEvent) {
+                    reading.firstEvent[folder->second] = number;
+                    --waiting;
+                }
+            }
+        };
+        const bool read = ForEachLine(queueFile, [&](std::string_view line) {
+            if (!ParseQueueRecord(line, record)) {
+                keptBytes += line.size() + 1;
+                if (keptBytes > kMaxKeptMalformedBytes) {
+                    return false;
+                }
+                reading.malformed.emplace_back(number++, std::string(line));
+                return true;
+            }
+            mark(record.path);
+            mark(record.pathOld);
+            ++number;
+            return waiting > 0;
+        });
+        reading.usable = read && keptBytes <= kMaxKeptMalformedBytes;
+        if (!reading.usable) {
+            reading.malformed.clear();
+        }
+        return reading;
+    }
+
+    std::vector<std::string> m_folders;
+    bool m_indexed = false;
+    std::unordered_map<std::string_view, size_t> m_index;  // views of m_folders, which no longer changes
+    std::vector<size_t> m_lengths;                         // the distinct lengths of the folders
+    std::map<std::string, FileReading> m_files;
+};
+
+bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
+                       const std::function<void(std::string_view line)> &malformed, bool &found)
+{
+    if (t_readings != nullptr && t_readings->Answer(queueFile, folder, malformed, found)) {
+        return true;
+    }
+    found = false;
+    QueueRecord record;
+    return ForEachLine(queueFile, [&](std::string_view line) {
+        if (!ParseQueueRecord(line, record)) {
+            malformed(line);
+            return true;
+        }
+        found = IsInside(record.path, folder) || IsInside(record.pathOld, folder);
+        return !found;
+    });
+}
+
+OneQueueReadingPerCall::OneQueueReadingPerCall(std::vector<std::string> folders)
+    : m_readings(new Readings(std::move(folders))), m_outer(t_readings)
+{
+    t_readings = m_readings.get();
+}
+
+OneQueueReadingPerCall::~OneQueueReadingPerCall()
+{
+    t_readings = m_outer;
+}
+
+}  // namespace FILEINDEX
+}  // namespace VEXO
