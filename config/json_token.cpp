@@ -64,31 +64,9 @@ bool DecodeJsonString(const char *begin, const char *end, std::string &out)
     return true;
 }
 
-bool ReadPlainJsonInteger(const char *begin, const char *end, int64_t &value)
+bool LibraryOnlyText::Decodes(const char *begin, const char *end)
 {
-    const bool negative = begin != end && *begin == '-';
-    const char *digits = negative ? begin + 1 : begin;
-    if (end - digits > 18) {
-        return false;
-    }
-    int64_t magnitude = 0;
-    for (const char *p = digits; p != end; ++p) {
-        if (*p < '0' || *p > '9') {
-            return false;
-        }
-        magnitude = magnitude * 10 + (*p - '0');
-    }
-    value = negative ? -magnitude : magnitude;
-    return true;
-}
-
-void LibraryOnlyText::See(JsonToken token, const char *begin, const char *end, bool escaped)
-{
-    int64_t ignored = 0;
-    if ((token == JsonToken::kNumber && !ReadPlainJsonInteger(begin, end, ignored)) ||
-        (escaped && !DecodeJsonString(begin, end, m_scratch))) {
-        m_seen = true;
-    }
+    return DecodeJsonString(begin, end, m_scratch);
 }
 
 }  // namespace FILEINDEX

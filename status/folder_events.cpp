@@ -1,6 +1,8 @@
 #include "status/folder_events.h"
 
 #include <algorithm>
+#include <cstdint>
+#include <cstring>
 #include <map>
 #include <unordered_map>
 #include <utility>
@@ -17,6 +19,58 @@ constexpr size_t kNoEvent = static_cast<size_t>(-1);
 constexpr size_t kMaxKeptMalformedBytes = 1024 * 1024;
 
 thread_local OneQueueReadingPerCall::Readings *t_readings = nullptr;
+
+// The last eight bytes (or fewer) of [text, text + length), with the length mixed in.
+uint64_t Tail(const char *text, size_t length)
+{
+    uint64_t word = 0;
+    const size_t size = std::min<size_t>(length, sizeof(word));
+    std::memcpy(&word, text + length - size, size);
+    return word ^ (length * 0x9E3779B97F4A7C15ULL);
+}
+
+// Counts of folders by the Tail of their text, in a table of a power-of-two size probed in line.
+class WaitingTails {
+public:
+    explicit WaitingTails(const std::vector<std::string> &folders)
+    {
+        while (m_slots.size() < 2 * folders.size()) {
+            m_slots.resize(m_slots.size() * 2);
+            --m_shift;
+        }
+        for (const std::string &folder : folders) {
+            const uint64_t tail = Tail(folder.data(), folder.size());
+            size_t i = Home(tail);
+            while (m_slots[i].used && m_slots[i].tail != tail) {
+                i = (i + 1) & (m_slots.size() - 1);
+            }
+            m_slots[i] = Slot{true, tail, m_slots[i].count + 1};
+        }
+    }
+
+    // The count for tail; null when no folder has it.
+    size_t *Find(uint64_t tail)
+    {
+        for (size_t i = Home(tail); m_slots[i].used; i = (i + 1) & (m_slots.size() - 1)) {
+            if (m_slots[i].tail == tail) {
+                return &m_slots[i].count;
+            }
+        }
+        return nullptr;
+    }
+
+private:
+    struct Slot {
+        bool used = false;
+        uint64_t tail = 0;
+        size_t count = 0;
+    };
+
+    size_t Home(uint64_t tail) const { return static_cast<size_t>((tail * 0x9E3779B97F4A7C15ULL) >> m_shift); }
+
+    std::vector<Slot> m_slots = std::vector<Slot>(2);
+    int m_shift = 63;
+};
 
 // path + "/" begins with folder + "/".
 bool IsInside(const std::string &path, std::string_view folder)
@@ -92,6 +146,9 @@ private:
         size_t waiting = m_folders.size();
         size_t number = 0;
         size_t keptBytes = 0;
+        // The folders still waiting for their first event, counted by the tail of their text: most
+        // events lie in folders that have had theirs, and are passed over without hashing a path.
+        WaitingTails waitingTails(m_folders);
         QueueRecord record;
         const auto mark = [&](const std::string &path) {
             for (const size_t length : m_lengths) {
@@ -101,10 +158,15 @@ private:
                 if (length < path.size() && path[length] != '/') {
                     continue;
                 }
+                size_t *const tailCount = waitingTails.Find(Tail(path.data(), length));
+                if (tailCount == nullptr || *tailCount == 0) {
+                    continue;
+                }
                 const auto folder = m_index.find(std::string_view(path.data(), length));
                 if (folder != m_index.end() && reading.firstEvent[folder->second] == kNoEvent) {
                     reading.firstEvent[folder->second] = number;
                     --waiting;
+                    --*tailCount;
                 }
             }
         };

@@ -48,7 +48,9 @@ TEST(QueueLineTest, TextReaderJudgesEveryLineAsTheJsonLibraryDoes)
         {R"({"event":1,"path\u0000":"/v/a"})", false, 0, "", ""},
         {R"({"event":1,"path":"/v/\ud800"})", false, 0, "", ""},
         {R"({"event":1,"path":"/v/a","data":1e400})", false, 0, "", ""},
-        {"{\"event\":1,\"path\":\"/v/\ta\"}", false, 0, "", ""},
+        {"{\"event\":1,\"path\":\"\t\"}", false, 0, "", ""},  // raw control characters, read one byte,
+        {"{\"event\":1,\"path\":\"/v/ab\tc\"}", false, 0, "", ""},  // eight
+        {"{\"event\":1,\"path\":\"/v/a\x01\",\"data\":\"0123456789abcdef\"}", false, 0, "", ""},  // and sixteen at a time
         {R"({"event":01,"path":"/v/a"})", false, 0, "", ""},
         {R"({"event":1,"path":"/v/a"} x)", false, 0, "", ""},
         {R"({"event":1,"path":"/v/a")", false, 0, "", ""},
