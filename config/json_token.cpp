@@ -5,9 +5,14 @@ namespace FILEINDEX {
 
 namespace {
 
-unsigned HexValue(char c)
+unsigned HexQuad(const char *text)
 {
-    return c <= '9' ? static_cast<unsigned>(c - '0') : static_cast<unsigned>((c | 0x20) - 'a' + 10);
+    unsigned value = 0;
+    for (int i = 0; i < 4; ++i) {
+        const char c = text[i];
+        value = value << 4 | (c <= '9' ? static_cast<unsigned>(c - '0') : static_cast<unsigned>((c | 0x20) - 'a' + 10));
+    }
+    return value;
 }
 
 void AppendUtf8(std::string &out, unsigned codePoint)
@@ -17,8 +22,13 @@ void AppendUtf8(std::string &out, unsigned codePoint)
     } else if (codePoint < 0x800) {
         out += static_cast<char>(0xC0 | (codePoint >> 6));
         out += static_cast<char>(0x80 | (codePoint & 0x3F));
-    } else {
+    } else if (codePoint < 0x10000) {
         out += static_cast<char>(0xE0 | (codePoint >> 12));
+        out += static_cast<char>(0x80 | ((codePoint >> 6) & 0x3F));
+        out += static_cast<char>(0x80 | (codePoint & 0x3F));
+    } else {
+        out += static_cast<char>(0xF0 | (codePoint >> 18));
+        out += static_cast<char>(0x80 | ((codePoint >> 12) & 0x3F));
         out += static_cast<char>(0x80 | ((codePoint >> 6) & 0x3F));
         out += static_cast<char>(0x80 | (codePoint & 0x3F));
     }
@@ -26,7 +36,7 @@ void AppendUtf8(std::string &out, unsigned codePoint)
 
 }  // namespace
 
-bool DecodeJsonString(const char *begin, const char *end, std::string &out)
+void DecodeJsonString(const char *begin, const char *end, std::string &out)
 {
     out.clear();
     for (const char *p = begin; p != end;) {
@@ -47,12 +57,11 @@ bool DecodeJsonString(const char *begin, const char *end, std::string &out)
         case 'r': out += '\r'; break;
         case 't': out += '\t'; break;
         case 'u': {
-            unsigned codePoint = 0;
-            for (int i = 0; i < 4; ++i) {
-                codePoint = codePoint << 4 | HexValue(*p++);
-            }
-            if (codePoint >= 0xD800 && codePoint <= 0xDBFF) {
-                return false;
+            unsigned codePoint = HexQuad(p);
+            p += 4;
+            if (codePoint >= 0xD800 && codePoint <= 0xDBFF) {  // the grammar lets a high one through paired only
+                codePoint = 0x10000 + ((codePoint - 0xD800) << 10) + (HexQuad(p + 2) - 0xDC00);
+                p += 6;
             }
             AppendUtf8(out, codePoint);
             break;
@@ -61,12 +70,6 @@ bool DecodeJsonString(const char *begin, const char *end, std::string &out)
             out += escape;
         }
     }
-    return true;
-}
-
-bool LibraryOnlyText::Decodes(const char *begin, const char *end)
-{
-    return DecodeJsonString(begin, end, m_scratch);
 }
 
 }  // namespace FILEINDEX

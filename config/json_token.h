@@ -1,6 +1,7 @@
 // Tokens that ScanJsonText (json_grammar.h) reports, read as the JSON library reads them, for
-// readers that take members straight from the text. Where the library follows rules of its own,
-// these functions decline, and the reader leaves that text to the library.
+// readers that take members straight from the text. The library reads one kind of token by rules
+// of its own, numbers that are not plain integers (it refuses 1e400, for one): a reader that meets
+// one leaves the whole text to the library.
 #ifndef FILEINDEX_CONFIG_JSON_TOKEN_H
 #define FILEINDEX_CONFIG_JSON_TOKEN_H
 
@@ -12,14 +13,12 @@
 namespace VEXO {
 namespace FILEINDEX {
 
-// The bytes a string stands for, from the text between its quotes: escapes resolved, every other
-// byte kept as it is. False for a \u escape of a high surrogate (\uD800 to \uDBFF), which the
-// library combines with the escape after it by rules of its own.
-bool DecodeJsonString(const char *begin, const char *end, std::string &out);
+// The bytes a string stands for, from the text between its quotes as ScanJsonText accepted it:
+// escapes resolved (a surrogate pair into its one character), every other byte kept as it is.
+void DecodeJsonString(const char *begin, const char *end, std::string &out);
 
 // The value of a number written as an integer of at most 18 digits, which the library reads
-// exactly. False for every other form (a fraction, an exponent, more digits), including some the
-// library refuses (1e400).
+// exactly. False for every other form (a fraction, an exponent, more digits).
 inline bool ReadPlainJsonInteger(const char *begin, const char *end, int64_t &value)
 {
     const bool negative = begin != end && *begin == '-';
@@ -38,26 +37,12 @@ inline bool ReadPlainJsonInteger(const char *begin, const char *end, int64_t &va
     return true;
 }
 
-// Watches the tokens of one scan for text that only the library can judge: a number other than a
-// plain integer, a string with a high-surrogate escape. A reader whose scan met such text hands
-// the whole text to the library instead.
-class LibraryOnlyText {
-public:
-    void See(JsonToken token, const char *begin, const char *end, bool escaped)
-    {
-        int64_t plain = 0;
-        if (token == JsonToken::kNumber ? !ReadPlainJsonInteger(begin, end, plain) : escaped && !Decodes(begin, end)) {
-            m_seen = true;
-        }
-    }
-    bool Seen() const { return m_seen; }
-
-private:
-    bool Decodes(const char *begin, const char *end);
-
-    bool m_seen = false;
-    std::string m_scratch;
-};
+// True for a token the library reads by rules of its own: a number other than a plain integer.
+inline bool NeedsJsonLibrary(JsonToken token, const char *begin, const char *end)
+{
+    int64_t plain = 0;
+    return token == JsonToken::kNumber && !ReadPlainJsonInteger(begin, end, plain);
+}
 
 }  // namespace FILEINDEX
 }  // namespace VEXO

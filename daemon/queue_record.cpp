@@ -27,13 +27,12 @@ class RecordMembers {
 public:
     void Key(int depth, const char *begin, const char *end, bool escaped)
     {
-        m_text.See(JsonToken::kString, begin, end, escaped);
         if (depth != 1) {
             return;
         }
         std::string_view name(begin, static_cast<size_t>(end - begin));
         if (escaped) {
-            DecodeJsonString(begin, end, m_name);  // a refusal is already in m_text
+            DecodeJsonString(begin, end, m_name);
             name = m_name;
         }
         m_current = name == "event" ? &m_event : name == "path" ? &m_path : name == "path_old" ? &m_pathOld : nullptr;
@@ -41,7 +40,7 @@ public:
 
     void Value(int depth, JsonToken token, const char *begin, const char *end, bool escaped)
     {
-        m_text.See(token, begin, end, escaped);
+        m_needsLibrary = m_needsLibrary || FILEINDEX::NeedsJsonLibrary(token, begin, end);
         if (depth == 0) {
             m_isObject = token == JsonToken::kObject;
         } else if (depth == 1 && m_current != nullptr) {
@@ -49,7 +48,7 @@ public:
         }
     }
 
-    bool NeedsJsonLibrary() const { return m_text.Seen(); }
+    bool NeedsJsonLibrary() const { return m_needsLibrary; }
 
     // The record the members make; false when they make none.
     bool Fill(QueueRecord &record) const
@@ -94,13 +93,14 @@ private:
             return false;
         }
         if (member.escaped) {
-            return DecodeJsonString(member.begin, member.end, out);
+            DecodeJsonString(member.begin, member.end, out);
+        } else {
+            out.assign(member.begin, member.end);
         }
-        out.assign(member.begin, member.end);
         return true;
     }
 
-    LibraryOnlyText m_text;
+    bool m_needsLibrary = false;
     std::string m_name;
     bool m_isObject = false;
     MemberText m_event;

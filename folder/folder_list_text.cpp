@@ -28,7 +28,6 @@ class FolderMembers {
 public:
     void Key(int depth, const char *begin, const char *end, bool escaped)
     {
-        m_text.See(JsonToken::kString, begin, end, escaped);
         if (depth == 1) {
             m_entries.emplace_back();
             Decode(begin, end, escaped, m_entries.back().path);
@@ -50,7 +49,7 @@ public:
 
     void Value(int depth, JsonToken token, const char *begin, const char *end, bool escaped)
     {
-        m_text.See(token, begin, end, escaped);
+        m_needsLibrary = m_needsLibrary || NeedsJsonLibrary(token, begin, end);
         if (depth == 0) {
             m_isObject = token == JsonToken::kObject;
         } else if (depth == 1) {
@@ -69,7 +68,7 @@ public:
         }
     }
 
-    bool Usable() const { return m_isObject && !m_text.Seen(); }
+    bool Usable() const { return m_isObject && !m_needsLibrary; }
 
     // The members in path order, the last of each path only.
     std::vector<Entry> TakeEntries()
@@ -89,12 +88,12 @@ private:
     {
         if (!escaped) {
             out.assign(begin, end);
-        } else if (!DecodeJsonString(begin, end, out)) {
-            out.clear();  // the library judges this text; m_text has seen it
+        } else {
+            DecodeJsonString(begin, end, out);
         }
     }
 
-    LibraryOnlyText m_text;
+    bool m_needsLibrary = false;
     bool m_isObject = false;
     bool m_inRecord = false;
     std::string m_key;
