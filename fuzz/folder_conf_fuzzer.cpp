@@ -1,6 +1,8 @@
 // folder.conf as the folder list reads it. Whatever the file holds, Load answers without crashing
-// or throwing; a list it accepts holds one folder per member, each found again by its own path,
-// and saving that list and loading it afresh gives the same folders byte for byte.
+// or throwing, and the list the queries read straight from the text is the one Load gives; a list
+// it accepts holds one folder per member, each found again by its own path, and saving that list
+// and loading it afresh gives the same folders byte for byte.
+#include <algorithm>
 #include <cstdlib>
 #include <vector>
 
@@ -13,6 +15,16 @@
 using namespace VEXO::FILEINDEX;
 
 namespace {
+
+bool SameFolders(const std::vector<Folder> &a, const std::vector<Folder> &b)
+{
+    const auto same = [](const Folder &x, const Folder &y) {
+        return x.m_path == y.m_path && x.m_fullPath == y.m_fullPath && x.m_name == y.m_name &&
+               x.m_bDocument == y.m_bDocument && x.m_bAudio == y.m_bAudio && x.m_bVideo == y.m_bVideo &&
+               x.m_bPhoto == y.m_bPhoto;
+    };
+    return a.size() == b.size() && std::equal(a.begin(), a.end(), b.begin(), same);
+}
 
 std::vector<Json::Value> Records(Folders &folders)
 {
@@ -35,8 +47,14 @@ std::vector<Json::Value> Records(Folders &folders)
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
 {
     fileindex_fuzz::WriteInput(FILEINDEX_FOLDER_CONF_PATH, data, size);
+    std::vector<Folder> fromText;
+    const bool listed = IndexMgr::List(fromText);
     Folders folders;
-    if (!folders.Load()) {
+    std::vector<Folder> loaded;
+    if (listed != (folders.Load() && folders.List(loaded)) || (listed && !SameFolders(fromText, loaded))) {
+        abort();
+    }
+    if (!listed) {
         return 0;
     }
     Json::Value document;

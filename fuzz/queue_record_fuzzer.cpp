@@ -1,7 +1,7 @@
 // One line of a share's event queue, as every scan of a queue judges it. Whatever the line holds,
-// the reader answers without crashing or throwing. A line it accepts says the same when written
-// again as a record, and the same line cut short anywhere, as a writer stopped mid-append leaves
-// it, is never taken for a record.
+// the reader answers without crashing or throwing, and exactly as the JSON library's reading of the
+// line does. A line it accepts says the same when written again as a record, and the same line cut
+// short anywhere, as a writer stopped mid-append leaves it, is never taken for a record.
 #include <cstdlib>
 #include <string>
 
@@ -32,7 +32,12 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
 {
     const std::string line(reinterpret_cast<const char *>(data), size);
     QueueRecord record;
-    if (!ParseQueueRecord(line, record)) {
+    QueueRecord throughLibrary;
+    const bool accepted = ParseQueueRecord(line, record);
+    if (accepted != ParseQueueRecordAsJsonValue(line, throughLibrary) || (accepted && !SameRecord(record, throughLibrary))) {
+        abort();
+    }
+    if (!accepted) {
         return 0;
     }
     QueueRecord again;
