@@ -4,6 +4,7 @@
 #include "config/log.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
+#include "folder/folder_list_text.h"
 #include "platform/monitor_queue.h"
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
@@ -29,9 +30,8 @@ bool IndexMgr::UpsertVNotifydCfg(const std::string &share)
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return false;
     }
-    Folders folders;
     std::vector<Folder> shareFolders;
-    if (!folders.Load() || !folders.List(shareFolders, share)) {
+    if (!LoadFolderList(shareFolders, share)) {
         return false;
     }
 

@@ -7,15 +7,27 @@ namespace FILEINDEX {
 
 Json::Value GetMostSuitableCfg(const std::vector<Folder> &folders, const std::string &fullPath)
 {
-    const std::string inside = fullPath + "/";
-    const Folder *governing = nullptr;
+    GoverningSetting governing(fullPath);
     for (const Folder &folder : folders) {
-        const std::string folderPath = folder.GetFullPath();
-        if (!folderPath.empty() && StringStartWith(inside, folderPath + "/")) {
-            governing = &folder;
-        }
+        governing.Consider(folder);
     }
-    return governing != nullptr ? governing->asJson() : Json::Value(Json::objectValue);
+    return governing.Record();
+}
+
+void GoverningSetting::Consider(const Folder &folder)
+{
+    const std::string resolved = folder.m_fullPath.empty() ? folder.GetFullPath() : std::string();
+    const std::string &folderPath = folder.m_fullPath.empty() ? resolved : folder.m_fullPath;
+    // fullPath + "/" begins with folderPath + "/".
+    if (!folderPath.empty() && StringStartWith(m_fullPath, folderPath) &&
+        (m_fullPath.size() == folderPath.size() || m_fullPath[folderPath.size()] == '/')) {
+        m_governing = &folder;
+    }
+}
+
+Json::Value GoverningSetting::Record() const
+{
+    return m_governing != nullptr ? m_governing->asJson() : Json::Value(Json::objectValue);
 }
 
 Json::Value DiffMediaTypes(const Json::Value &a, const Json::Value &b)

@@ -4,6 +4,7 @@
 #include <optional>
 #include <string_view>
 
+#include "config/file_io.h"
 #include "config/json_token.h"
 #include "fileindex/utils.h"
 
@@ -122,6 +123,34 @@ bool ReadFolderListText(const std::string &text, std::vector<Folder> &out)
         GetFullPath(folder.m_fullPath, folder.m_path);
     }
     return true;
+}
+
+bool LoadFolderList(std::vector<Folder> &out, const std::string &share)
+{
+    Folders folders;
+    const std::string path = folders.GetPath();
+    if (!IsFileExist(path)) {
+        out.clear();  // the first-run state: no folders
+        return true;
+    }
+    std::string text;
+    std::vector<Folder> all;
+    if (!ReadWholeFile(path, text) || !ReadFolderListText(text, all)) {
+        return folders.Load() && folders.List(out, share);
+    }
+    out.clear();
+    for (Folder &folder : all) {
+        if (IsListedForShare(folder.m_path, share)) {
+            out.push_back(std::move(folder));
+        }
+    }
+    return true;
+}
+
+bool IsListedForShare(const std::string &path, const std::string &share)
+{
+    std::string folderShare;
+    return share.empty() || (GetShareNameByPath(folderShare, path) && folderShare == share);
 }
 
 }  // namespace FILEINDEX

@@ -17,6 +17,15 @@ namespace FILEINDEX {
 // the JSON library can judge (see json_token.h); the caller then loads it through Folders.
 bool ReadFolderListText(const std::string &text, std::vector<Folder> &out);
 
+// Folders::Load followed by Folders::List(out, share), folder.conf read with ReadFolderListText
+// where it can be: the same folders, the same look-ups in the share database, the same log lines and
+// error codes. False, out untouched, when folder.conf cannot be loaded.
+bool LoadFolderList(std::vector<Folder> &out, const std::string &share);
+
+// Whether the folder at path belongs in Folders::List(out, share): every folder for an empty share,
+// else a folder whose path names the share exactly.
+bool IsListedForShare(const std::string &path, const std::string &share);
+
 }  // namespace FILEINDEX
 }  // namespace VEXO
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <optional>
 
 #include "appliance_paths.h"
 #include "config/json_io.h"
@@ -9,6 +10,7 @@
 #include "fileindex/error.h"
 #include "fileindex/utils.h"
 #include "folder/change_report.h"
+#include "folder/folder_list_text.h"
 #include "platform/unicode.h"
 #include "status/folder_events.h"
 
@@ -101,10 +103,6 @@ bool Folders::Get(Json::Value &out, const std::string &path)
 
 bool Folders::Upsert(Json::Value &out, const Json::Value &request)
 {
-    std::vector<Folder> before;
-    if (!List(before)) {
-        return false;
-    }
     std::string path;
     std::string fullPath;
     if (!RetrieveStringFromJsonObj(path, "path", request) || !GetFullPath(fullPath, path)) {
@@ -114,6 +112,7 @@ bool Folders::Upsert(Json::Value &out, const Json::Value &request)
     }
 
     auto entry = m_folders.find(path);
+    std::optional<Folder> previous;  // the record as it was, when the path had one
     if (entry == m_folders.end()) {
         Folder folder;
         folder.Reload(path, request);
@@ -124,12 +123,22 @@ bool Folders::Upsert(Json::Value &out, const Json::Value &request)
             return false;
         }
     } else {
+        previous = entry->second;
         Folder merged = entry->second;
         merged.Load(path, request);
         entry->second = merged;
     }
 
-    out = DiffMediaTypes(GetMostSuitableCfg(before, fullPath), entry->second.asJson());
+    // The setting that governed the path before: the table as it was, walked in its order.
+    GoverningSetting before(fullPath);
+    for (const auto &folder : m_folders) {
+        if (&folder.second != &entry->second) {
+            before.Consider(folder.second);
+        } else if (previous) {
+            before.Consider(*previous);
+        }
+    }
+    out = DiffMediaTypes(before.Record(), entry->second.asJson());
     return true;
 }
 
@@ -162,8 +171,7 @@ bool Folders::List(std::vector<Folder> &out, const std::string &share)
 {
     out.clear();
     for (const auto &entry : m_folders) {
-        std::string folderShare;
-        if (share.empty() || (GetShareNameByPath(folderShare, entry.first) && folderShare == share)) {
+        if (IsListedForShare(entry.first, share)) {
             out.push_back(entry.second);
         }
     }

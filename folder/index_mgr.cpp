@@ -1,8 +1,6 @@
 #include "fileindex/index_mgr.h"
 
-#include "config/file_io.h"
 #include "config/unlock_on_return.h"
-#include "fileindex/utils.h"
 #include "folder/folder_list_text.h"
 #include "share/share_lookup.h"
 
@@ -12,17 +10,7 @@ namespace FILEINDEX {
 bool IndexMgr::List(std::vector<Folder> &out)
 {
     const OneShareLookupPerCall shareLookups;
-    Folders folders;
-    const std::string path = folders.GetPath();
-    if (!IsFileExist(path)) {
-        out.clear();  // the first-run state: no folders
-        return true;
-    }
-    std::string text;
-    if (ReadWholeFile(path, text) && ReadFolderListText(text, out)) {
-        return true;
-    }
-    return folders.Load() && folders.List(out);
+    return LoadFolderList(out, std::string());
 }
 
 bool IndexMgr::List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,

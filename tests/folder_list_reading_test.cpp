@@ -78,6 +78,36 @@ TEST_F(FolderListReadingTest, TextReaderListsWhatTheFolderListLoads)
     }
 }
 
+// An upsert's report compares the new setting with the one that governed the path before; a folder
+// whose share was unknown when the list was loaded is asked for again then, and logged if still
+// unknown, before it is passed over.
+TEST_F(FolderListReadingTest, FolderUnresolvedAtLoadIsAskedForAgainWhenAnUpsertIsJudged)
+{
+    const struct {
+        bool shareAppears;
+        const char *path;   // of the setting added, with photo true
+        bool photoChanges;  // in its report
+        std::vector<std::string> messages;
+    } cases[] = {
+        {true, "/later/a/b", false, {}},
+        {false, "/photo/x", true, {"Failed to get full path from /later/a"}},
+    };
+    for (const auto &c : cases) {
+        SetUp();
+        WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/later/a":{"photo":true}})");
+        Folders folders;
+        ASSERT_TRUE(folders.Load());
+        DeclareShares(c.shareAppears ? "volume1/photo volume1/later" : "volume1/photo volume1/other");
+        Json::Value setting = ParseJson(R"({"photo":true})");
+        setting["path"] = c.path;
+        Json::Value report;
+        LogCapture::Clear();
+        ASSERT_TRUE(folders.Upsert(report, setting)) << c.path;
+        EXPECT_EQ(report["photo"].asBool(), c.photoChanges) << c.path;
+        EXPECT_EQ(LogCapture::Messages(), c.messages) << c.path;
+    }
+}
+
 // Another process saves a list of the same size, most likely within the same clock tick: the very
 // next query answers from it.
 TEST_F(FolderListReadingTest, SaveByAnotherProcessIsSeenByTheNextQuery)
