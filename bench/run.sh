@@ -6,7 +6,10 @@
 #   bench/run.sh [repetitions]      (default 7; ./dev.sh bench runs this)
 #
 # Times are CPU times of the benchmark's thread, which the load of other processes on the machine
-# barely changes; the upsert, which waits for the stand-in daemon, is wall-clock time.
+# changes far less than wall-clock times; the upsert, which waits for the stand-in daemon, is
+# wall-clock time. A benchmark named <goal>/part:<name> measures a part of the others of its goal;
+# it is shown against the baseline but has no goal of its own, and it is the reference for their
+# memory.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 repetitions=${1:-7}
@@ -33,15 +36,19 @@ jq -rs '
   def ms: . * 100 | round / 100 | tostring + " ms";
   [.[].benchmarks[] | select(.aggregate_name == "median")] | sort_by(.run_name) as $runs
   | ($runs | map(select(.run_name | test("/baseline:"))) | map({key: (.run_name | split("/")[0]), value: .}) | from_entries) as $baselines
+  | ($runs | map(select(.run_name | test("/part:"))) | map({key: (.run_name | split("/")[0]), value: .}) | from_entries) as $parts
   | $runs[] | select(.run_name | test("/baseline:") | not)
   | (.run_name | split("/")[0]) as $target
-  | if $target == "P4" then
+  | if (.run_name | test("/part:")) then
+      "| \($target), a part | \(.run_name) | \(.cpu_time | ms) | \($baselines[$target].run_name | split(":")[1]) \($baselines[$target].cpu_time | ms) | \(.cpu_time / $baselines[$target].cpu_time * 100 | round / 100) | |"
+    elif $target == "P4" then
       "| P4 under 1 s | \(.run_name) | \(.real_time | ms) (wall) | | | \(if .real_time < 1000 then "yes" else "no" end) |"
     else
       (.cpu_time / $baselines[$target].cpu_time) as $ratio
       | "| \($target) at most \(goal[$target])× | \(.run_name) | \(.cpu_time | ms) | \($baselines[$target].run_name | split(":")[1]) \($baselines[$target].cpu_time | ms) | \($ratio * 100 | round / 100) | \(if $ratio <= goal[$target] then "yes" else "no" end) |",
         (if .peak_growth_KiB != null then
-           "| P5 a few MB at most | \(.run_name): peak memory growth | \(.peak_growth_KiB) KiB | getline \($baselines[$target].peak_growth_KiB) KiB | | \(if .peak_growth_KiB <= 4096 then "yes" else "no" end) |"
+           ($parts[$target] // $baselines[$target]) as $reference
+           | "| P5 at most 4 MiB above the reference | \(.run_name): peak memory growth | \(.peak_growth_KiB) KiB | \($reference.run_name | split(":")[1]) \($reference.peak_growth_KiB) KiB | | \(if .peak_growth_KiB - $reference.peak_growth_KiB <= 4096 then "yes" else "no" end) |"
          else empty end)
     end
 ' "$results"/*.json

@@ -1,6 +1,9 @@
 #include "bench/sandbox.h"
 
+#include <malloc.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
@@ -224,14 +227,34 @@ size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::
 
 long PeakMemoryGrowthKiB(const std::function<void()> &run)
 {
-    if (!ResetPeakResident()) {
-        run();
+    // In a child, which first hands the free memory of its heap back, so that what run allocates
+    // shows even where the process had such memory from earlier work.
+    int channel[2];
+    if (pipe(channel) != 0) {
         return -1;
     }
-    const long before = PeakResidentKiB();
-    run();
-    const long after = PeakResidentKiB();
-    return before < 0 || after < 0 ? -1 : after - before;
+    const pid_t child = fork();
+    if (child == 0) {
+        malloc_trim(0);
+        long growth = -1;
+        if (ResetPeakResident()) {
+            const long before = PeakResidentKiB();
+            run();
+            const long after = PeakResidentKiB();
+            growth = before < 0 || after < 0 ? -1 : after - before;
+        }
+        _exit(write(channel[1], &growth, sizeof(growth)) == sizeof(growth) ? 0 : 1);
+    }
+    close(channel[1]);
+    long growth = -1;
+    if (child < 0 || read(channel[0], &growth, sizeof(growth)) != sizeof(growth)) {
+        growth = -1;
+    }
+    close(channel[0]);
+    if (child > 0) {
+        waitpid(child, nullptr, 0);
+    }
+    return growth;
 }
 
 size_t GetlinePass(const std::string &path)

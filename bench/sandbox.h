@@ -49,8 +49,8 @@ void WriteFolderConf(const std::vector<std::string> &folders);
 // bytes that are not UTF-8. Written as it is generated, never held in memory. Returns its size.
 size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::string> &fullFolders);
 
-// How much the process's peak resident memory grows while run runs, in KiB (-1 when the system
-// does not tell).
+// How much a process's peak resident memory grows while run runs, in KiB (-1 when the system does
+// not tell): measured in a child process that has handed its free heap memory back first.
 long PeakMemoryGrowthKiB(const std::function<void()> &run);
 
 // The baseline of every queue benchmark: one std::getline pass over the file; returns the lines.
