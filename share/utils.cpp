@@ -44,8 +44,8 @@ const std::vector<std::string> kExcludedShareNames = {"surveillance", "NetBackup
 using ShareRecord = std::unique_ptr<VEXOSHARE, decltype(&VEXOShareFree)>;
 
 // Formats S/@eaDir/<name> of the share into out (truncated to its size), making S/@eaDir (through
-// a work buffer of 4096 bytes) and, for the database, the final directory on the way. The length written, or -1 when the
-// arguments are invalid or the share is unknown.
+// a work buffer of 4096 bytes) and, for the database, the final directory on the way. The length
+// written, or -1 when the arguments are invalid or the share is unknown.
 int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *outArgument, const char *name,
                    bool makeFinalDir)
 {
