@@ -1,6 +1,7 @@
 // fileindexctl share ...: what follows a shared folder's life, and what the index keeps in it.
 #include <sys/stat.h>
 
+#include <functional>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -128,47 +129,43 @@ int Rename(const Context &context, const std::string &from, const std::string &t
     return kSuccess;
 }
 
-int PauseShare(const Context &context, const std::string &share)
-{
-    ClearLastError();
-    if (!IndexMgr::SharePause(share)) {
-        return Fail("share pause " + share,
-                    "fileindexd did not take the command, or the share's change monitoring could not be removed");
-    }
-    return Done(context, share, "fileindexd told to delete its worker, change monitoring removed");
-}
+// A share subcommand that is one library call: what it calls, what a failure may mean, and the line
+// printed on success.
+struct ShareAction {
+    const char *name;
+    const char *description;
+    bool (*call)(const std::string &share);
+    const char *failureHint;
+    const char *doneLine;
+};
 
-int ResumeShare(const Context &context, const std::string &share)
-{
-    ClearLastError();
-    if (!IndexMgr::ShareResume(share)) {
-        return Fail("share resume " + share,
-                    "the share's change monitoring could not be registered, or fileindexd did not take the command");
-    }
-    return Done(context, share, "change monitoring registered, fileindexd told to revive its worker");
-}
+const ShareAction kShareActions[] = {
+    {"pause", "stop indexing the share: fileindexd deletes its worker, change monitoring removed",
+     IndexMgr::SharePause,
+     "fileindexd did not take the command, or the share's change monitoring could not be removed",
+     "fileindexd told to delete its worker, change monitoring removed"},
+    {"resume", "index the share again: change monitoring registered, fileindexd revives its worker",
+     IndexMgr::ShareResume,
+     "the share's change monitoring could not be registered, or fileindexd did not take the command",
+     "change monitoring registered, fileindexd told to revive its worker"},
+    {"clean", "wipe the share's event queue and index database", IndexMgr::CleanShareIndexData,
+     kUnknownShareHint, "event queue and index database removed"},
+    {"revive", "clear the share's out-of-space mark and tell fileindexd to revive the share's worker",
+     StatusMgr::ShareRevive, kDaemonHint, "out-of-space mark cleared, fileindexd told to revive its worker"},
+};
 
-int Clean(const Context &context, const std::string &share)
+int RunShareAction(const Context &context, const ShareAction &action, const std::string &share)
 {
     ClearLastError();
-    if (!IndexMgr::CleanShareIndexData(share)) {
-        return Fail("share clean " + share, kUnknownShareHint);
+    if (!action.call(share)) {
+        return Fail(std::string("share ") + action.name + " " + share, action.failureHint);
     }
-    return Done(context, share, "event queue and index database removed");
-}
-
-int Revive(const Context &context, const std::string &share)
-{
-    ClearLastError();
-    if (!StatusMgr::ShareRevive(share)) {
-        return Fail("share revive " + share, kDaemonHint);
-    }
-    return Done(context, share, "out-of-space mark cleared, fileindexd told to revive its worker");
+    return Done(context, share, action.doneLine);
 }
 
 // Adds "share <name> SHARE" running run(context, share).
 void AddShareCommand(CLI::App &share, Context &context, const std::string &name, const std::string &description,
-                     int (*run)(const Context &, const std::string &))
+                     std::function<int(const Context &, const std::string &)> run)
 {
     auto shareName = std::make_shared<std::string>();
     AddCommand(share, context, name, description, [&context, run, shareName]() { return run(context, *shareName); })
@@ -191,13 +188,12 @@ void AddShareCommands(CLI::App &app, Context &context)
                                   [&context, names]() { return Rename(context, names->first, names->second); });
     rename->add_option("OLD", names->first, "the share's old name")->required();
     rename->add_option("NEW", names->second, "the share's new name")->required();
-    AddShareCommand(*share, context, "pause",
-                    "stop indexing the share: fileindexd deletes its worker, change monitoring removed", PauseShare);
-    AddShareCommand(*share, context, "resume",
-                    "index the share again: change monitoring registered, fileindexd revives its worker", ResumeShare);
-    AddShareCommand(*share, context, "clean", "wipe the share's event queue and index database", Clean);
-    AddShareCommand(*share, context, "revive",
-                    "clear the share's out-of-space mark and tell fileindexd to revive the share's worker", Revive);
+    for (const ShareAction &action : kShareActions) {
+        AddShareCommand(*share, context, action.name, action.description,
+                        [&action](const Context &runContext, const std::string &shareName) {
+                            return RunShareAction(runContext, action, shareName);
+                        });
+    }
     AddShareCommand(*share, context, "space",
                     "whether the share's volume has the 10 MiB indexing needs, and the share's marks", Space);
     AddShareCommand(*share, context, "paths",
