@@ -13,6 +13,8 @@
 #include "fileindex/error.h"
 #include "fileindex/utils.h"
 
+FILEIDX_LOG_UNIT("config.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

@@ -9,6 +9,8 @@
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
+FILEIDX_LOG_UNIT("index_mgr.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

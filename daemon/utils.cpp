@@ -15,6 +15,8 @@
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
+FILEIDX_LOG_UNIT("utils.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

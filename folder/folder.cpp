@@ -6,6 +6,8 @@
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
 
+FILEIDX_LOG_UNIT("folder.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

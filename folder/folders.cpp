@@ -14,6 +14,8 @@
 #include "platform/unicode.h"
 #include "status/folder_events.h"
 
+FILEIDX_LOG_UNIT("folders.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

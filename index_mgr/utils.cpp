@@ -13,6 +13,8 @@
 #include "platform/service.h"
 #include "platform/share_db.h"
 
+FILEIDX_LOG_UNIT("utils.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

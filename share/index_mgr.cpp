@@ -4,6 +4,8 @@
 #include "fileindex/fileidx.h"
 #include "fileindex/utils.h"
 
+FILEIDX_LOG_UNIT("index_mgr.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

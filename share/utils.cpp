@@ -18,6 +18,8 @@
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
+FILEIDX_LOG_UNIT("utils.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 
@@ -55,7 +57,7 @@ int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *ou
                                              : nullptr;
     if (invalid != nullptr) {
         FILEIDX_LOG("%s:%d Invaild Argument (%s)=[%d]\n", invalid, 0);
-        VLIBCErrSetEx(kPlatformBadParameter, __FILE_NAME__, __LINE__);
+        VLIBCErrSetEx(kPlatformBadParameter, kLogUnit, __LINE__);
         return -1;
     }
     PVEXOSHARE share = nullptr;

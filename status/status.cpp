@@ -7,6 +7,8 @@
 #include "fileindex/error.h"
 #include "fileindex/utils.h"
 
+FILEIDX_LOG_UNIT("status.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 

@@ -13,6 +13,8 @@
 #include "share/storage_paths.h"
 #include "status/folder_events.h"
 
+FILEIDX_LOG_UNIT("status_mgr.cpp");
+
 namespace VEXO {
 namespace FILEINDEX {
 
