@@ -64,8 +64,10 @@ shift || true
 case "$command" in
 demo)
     install_missing_packages
-    build dev
-    ./build/dev/tools/fileindex-demo
+    # A build of its own, so that its sandbox (build/demo/root) stays for exploring whatever the
+    # tests, which rebuild build/dev/root, do meanwhile.
+    build demo
+    ./build/demo/tools/fileindex-demo
     ;;
 test)
     werror=OFF

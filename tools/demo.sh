@@ -206,5 +206,5 @@ cat <<EOF
   fileindexctl folder list --with status,is_valid --json
   fileindexctl --help
 The frames the daemon received are in fileindexd-commands.jsonl, the platform's calls in
-emulation/journal.jsonl. The test suite rebuilds this sandbox when it runs.
+emulation/journal.jsonl. The next run of the demo sets this sandbox up afresh.
 EOF
