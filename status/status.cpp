@@ -1,5 +1,7 @@
 #include "fileindex/status.h"
 
+#include <cstring>
+
 #include <json/value.h>
 
 #include "appliance_paths.h"
@@ -19,40 +21,32 @@ const char kNoSpace[] = "no_space";
 const char kNeedReindex[] = "need_reindex";
 constexpr long long kNotPaused = -1;
 
-// Adds or removes share in the per-share mark object key, which is created as null when absent (any
-// other value is left as it is). Returns whether share was newly added.
-bool SetShareMark(Json::Value &document, const char *key, const std::string &share, bool flag)
+// An operation meets a member the JSON library would throw on: it fails alone, with the document
+// as it was, so that every other operation keeps working on the file.
+bool RefuseUnreadableMember()
 {
+    FILEIDX_LOG("%s:%d json exception");
+    ErrorHandler::SetError(FILEIDX_ERR_LOAD_CONFIG);
+    return false;
+}
+
+// Adds or removes share in the per-share mark object key, which is created as null when absent.
+// added tells whether share was newly added. A mark that is neither an object nor null cannot take
+// a share: false, document untouched.
+bool SetShareMark(Json::Value &document, const char *key, const std::string &share, bool flag, bool &added)
+{
+    added = false;
+    const Json::Value *existing = document.find(key, key + strlen(key));
+    if (existing != nullptr && !existing->isObject() && !existing->isNull()) {
+        return RefuseUnreadableMember();
+    }
     Json::Value &marks = document[key];
     if (!flag) {
         marks.removeMember(share);
-        return false;
+        return true;
     }
-    const bool added = !marks.isMember(share);
+    added = !marks.isMember(share);
     marks[share] = true;
-    return added;
-}
-
-// The layout every operation below can read and change without the JSON library throwing: an
-// object whose share marks are objects (or null, as clearing an absent mark leaves them) and whose
-// updated marks read as booleans. "resume_time" may hold anything: GetPauseInfo reports a pause time
-// it cannot read ("json exception") and every other operation only overwrites it.
-bool IsStatusLayout(const Json::Value &document)
-{
-    if (!document.isObject()) {
-        return false;
-    }
-    for (auto member = document.begin(); member != document.end(); ++member) {
-        const std::string key = member.name();
-        if (key == kResumeTime) {
-            continue;
-        }
-        const bool readable = key == kNoSpace || key == kNeedReindex ? member->isObject() || member->isNull()
-                                                                    : member->isConvertibleTo(Json::booleanValue);
-        if (!readable) {
-            return false;
-        }
-    }
     return true;
 }
 
@@ -79,8 +73,9 @@ bool Status::Load()
     if (!LoadJson()) {
         return false;
     }
-    // A document of another shape is refused like an unparsable one, before any operation trips on it.
-    if (!IsStatusLayout(m_jsConfig)) {
+    // No operation can work on a top level other than an object: it is refused like an unparsable
+    // file. A member of the wrong type fails only the operations that touch it.
+    if (!m_jsConfig.isObject()) {
         FILEIDX_LOG("%s:%d Failed to load json from %s", GetPath().c_str());
         ErrorHandler::SetError(FILEIDX_ERR_LOAD_CONFIG);
         return false;
@@ -101,20 +96,22 @@ bool Status::SetUpdated(const std::string &name)
 
 bool Status::IsUpdated(const std::string &name)
 {
-    // The share marks share the top level with the updated marks: asked about as an updated mark,
-    // a member the JSON library cannot read as a boolean (an object, a text) is none, rather than
-    // an exception out of the library.
-    if (!m_jsConfig.isMember(name)) {
+    // A number, null or boolean reads as the JSON library reads it (1 is true). A text, an array or
+    // an object (the share marks share the top level) cannot be read as a boolean.
+    const Json::Value *member = m_jsConfig.find(name.data(), name.data() + name.size());
+    if (member == nullptr) {
         return false;
     }
-    const Json::Value &member = m_jsConfig[name];
-    return member.isConvertibleTo(Json::booleanValue) && member.asBool();
+    if (!member->isConvertibleTo(Json::booleanValue)) {
+        return RefuseUnreadableMember();
+    }
+    return member->asBool();
 }
 
 bool Status::ShareSetNeedReindex(const std::string &share, bool flag)
 {
-    SetShareMark(m_jsConfig, kNeedReindex, share, flag);
-    return true;
+    bool added = false;
+    return SetShareMark(m_jsConfig, kNeedReindex, share, flag, added);
 }
 
 bool Status::ShareIsNeedReindex(const std::string &share)
@@ -124,8 +121,12 @@ bool Status::ShareIsNeedReindex(const std::string &share)
 
 bool Status::ShareSetNoSpace(const std::string &share, bool flag)
 {
+    bool added = false;
+    if (!SetShareMark(m_jsConfig, kNoSpace, share, flag, added)) {
+        return false;
+    }
     // The administrators hear of a share only when it is newly marked.
-    if (SetShareMark(m_jsConfig, kNoSpace, share, flag) && !NotifyNoSpace()) {
+    if (added && !NotifyNoSpace()) {
         FILEIDX_LOG("%s:%d NotifyNoSpace failed");
     }
     return true;

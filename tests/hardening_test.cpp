@@ -226,45 +226,6 @@ TEST_F(HardeningTest, CutAppendNeverSpoilsTheNextRecord)
     }
 }
 
-// A status file that cannot be read, or of the wrong layout, is refused by every status call, instead
-// of an exception thrown out of the library into a caller that cannot expect it.
-TEST_F(HardeningTest, WronglyShapedStatusFileIsRefusedByEveryCall)
-{
-    long long resumeTime = 0;
-    const std::function<bool()> calls[] = {
-        [] { return StatusMgr::IsUpdated("x"); },
-        [] { return StatusMgr::ShareIsNoSpace("photo"); },
-        [] { return StatusMgr::ShareIsNeedReindex("photo"); },
-        [&] { return StatusMgr::GetPauseInfo(resumeTime); },
-        [] { return StatusMgr::SetUpdated("x"); },
-        [] { return StatusMgr::ShareSetNoSpace("photo", true); },
-        [] { return StatusMgr::ShareSetNeedReindex("photo", false); },
-        [] { return StatusMgr::ShareRevive("photo"); },
-        [] { return StatusMgr::Resume(); },
-        [] { return StatusMgr::Pause(1); },
-    };
-    for (const char *document : {"{\"resume_time\":", "0", "[]", "null", "\"x\"", R"({"need_reindex":5})", R"({"no_space":[]})",
-                                 R"({"no_space":true})", R"({"x":"yes"})", R"({"x":[]})"}) {
-        SCOPED_TRACE(document);
-        WriteFile(kStatusConf, document);
-        for (const std::function<bool()> &call : calls) {
-            LogCapture::Clear();
-            ErrorHandler::SetError(FILEIDX_ERR_NONE);
-            EXPECT_FALSE(call());
-            EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_LOAD_CONFIG);
-            EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"Failed to load json from " + kStatusConf});
-        }
-        EXPECT_EQ(ReadFile(kStatusConf), document);
-        EXPECT_FALSE(IsLockHeld(kStatusLock));
-        // The event queue's fall-back meets the same refusal and reports it.
-        LogCapture::Clear();
-        EXPECT_FALSE(AddCustomEvent(kEventReindex, HostPath("/volume9/x"), Json::Value()));
-        EXPECT_EQ(LogCapture::Messages(),
-                  (std::vector<std::string>{"VEXOShareNamePathGet failed, path=" + HostPath("/volume9/x"),
-                                            "Failed to load json from " + kStatusConf, "ShareSetNeedReindex failed, share="}));
-    }
-}
-
 // A temporary file of a saver that died, or that has sat for over an hour (its process number may
 // since belong to another program), is swept by the next save; a recent one of a live saver stays.
 TEST_F(HardeningTest, SaveSweepsTemporariesOfGoneOrLongStalledSavers)

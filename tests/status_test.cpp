@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <ctime>
 #include <functional>
+#include <map>
 #include <memory>
 
 #include "fileindex/error.h"
@@ -43,31 +44,6 @@ protected:
     static Json::Value Stored() { return ParseJson(ReadFile(kStatusConf)); }
 };
 
-// An updated mark is set when it reads as true; a share mark cleared before any was set leaves a
-// null that marks no share.
-TEST_F(StatusTest, MarksReadAsJsonBooleansAndAClearedAbsentOneIsANull)
-{
-    WriteFile(kStatusConf, R"({"one":1,"zero":0,"no":false,"no_space":{"photo":true}})");
-    EXPECT_TRUE(StatusMgr::IsUpdated("one"));
-    for (const char *name : {"no_space", "zero", "no", "absent"}) {
-        EXPECT_FALSE(StatusMgr::IsUpdated(name)) << name;
-    }
-    ASSERT_TRUE(StatusMgr::SetUpdated("no"));
-    EXPECT_EQ(Stored(), ParseJson(R"({"one":1,"zero":0,"no":true,"no_space":{"photo":true}})"));
-
-    stdfs::remove(kStatusConf);
-    ASSERT_TRUE(StatusMgr::ShareSetNoSpace("photo", false));
-    ASSERT_TRUE(StatusMgr::ShareSetNeedReindex("photo", false));
-    EXPECT_EQ(ReadFile(kStatusConf), R"({"need_reindex":null,"no_space":null})");
-    EXPECT_FALSE(StatusMgr::ShareIsNoSpace("photo"));
-    EXPECT_FALSE(StatusMgr::ShareIsNeedReindex("photo"));
-    for (const auto &[share, flag] : {std::pair{"photo", true}, {"music", true}, {"photo", false}}) {
-        ASSERT_TRUE(StatusMgr::ShareSetNeedReindex(share, flag));
-    }
-    EXPECT_EQ(Stored()["need_reindex"], ParseJson(R"({"music":true})"));
-    EXPECT_TRUE(StatusMgr::ShareIsNeedReindex("music"));
-}
-
 TEST_F(StatusTest, AdministratorsAreToldOnceWhenAShareRunsOutOfSpaceAndAFailedNoticeIsLogged)
 {
     ASSERT_TRUE(StatusMgr::ShareSetNoSpace("photo", true));
@@ -92,36 +68,111 @@ TEST_F(StatusTest, AdministratorsAreToldOnceWhenAShareRunsOutOfSpaceAndAFailedNo
     EXPECT_EQ(LogCapture::Messages(), std::vector<std::string>{"NotifyNoSpace failed"});
 }
 
-// No pause time means running (-1). One that cannot be read is the pause query's own failure: it
-// logs "json exception", sets no error code and leaves the caller's value; the other calls go on.
-TEST_F(StatusTest, PauseTimeReadsAsStoredAndAnUnreadableOneFailsOnlyTheQuery)
+// status.conf as other programs leave it: a client's updated mark written as a text, a share mark
+// that is not an object, a pause time that is not a number. An operation that cannot read the member
+// it touches fails alone ("json exception", error 6, the file as it was, nothing sent); every other
+// operation answers and writes as on a well-formed file, and updated marks read as the JSON library
+// reads booleans (1 is true). An unreadable pause time is the pause query's own failure, which sets
+// no error code. A top level that is not an object is refused by every operation as unreadable,
+// instead of an exception thrown out of the library into a caller that cannot expect it. A writer
+// that meets another process's lock fails and sends nothing; readers take no lock.
+TEST_F(StatusTest, AMemberOfTheWrongTypeFailsOnlyTheOperationsThatTouchIt)
 {
-    const struct {
-        const char *document;  // nullptr: no status file
-        bool read;
-        long long resumeTime;
-    } cases[] = {
-        {nullptr, true, -1},
-        {R"({"resume_time":1700000000})", true, 1700000000},
-        // What the library itself writes, and integral numbers however spelt.
-        {R"({"resume_time":1.7e9,"no_space":null,"need_reindex":{"a":true},"n":null})", true, 1700000000},
-        {R"({"resume_time":1.5})", true, 1},
-        {R"({"resume_time":"abc"})", false, 42},
-        {R"({"resume_time":{}})", false, 42},
+    long long resumeTime = 42;
+    // Each operation, given the word after its name in a row.
+    const std::map<std::string, std::function<bool(const std::string &)>> operations = {
+        {"IsUpdated", &StatusMgr::IsUpdated},
+        {"SetUpdated", &StatusMgr::SetUpdated},
+        {"ShareIsNoSpace", &StatusMgr::ShareIsNoSpace},
+        {"ShareIsNeedReindex", &StatusMgr::ShareIsNeedReindex},
+        {"ShareRevive", &StatusMgr::ShareRevive},
+        {"ShareSetNoSpace", [](const std::string &flag) { return StatusMgr::ShareSetNoSpace("photo", flag == "on"); }},
+        {"ShareSetNeedReindex",
+         [](const std::string &flag) { return StatusMgr::ShareSetNeedReindex("photo", flag == "on"); }},
+        {"Pause", [](const std::string &) { return StatusMgr::Pause(0); }},
+        {"Resume", [](const std::string &) { return StatusMgr::Resume(); }},
+        {"GetPauseInfo", [&](const std::string &) { return StatusMgr::GetPauseInfo(resumeTime); }},
     };
-    for (const auto &c : cases) {
-        SCOPED_TRACE(c.document == nullptr ? "(no file)" : c.document);
+    const std::string marks = R"({"one":1,"zero":0,"str":"x"})";
+    const std::string noSpaceList = R"({"no_space":[],"need_reindex":{"music":true},"resume_time":0})";
+    const std::string reindexNumber = R"({"need_reindex":5})";
+    const std::vector<std::string> quiet, exception = {"json exception"};
+    const auto none = FILEIDX_ERR_NONE, unreadable = FILEIDX_ERR_LOAD_CONFIG;
+    struct Row {
+        std::string document;  // "": no status file
+        std::string operation;
+        std::string answer;  // GetPauseInfo's followed by the caller's value afterwards
+        std::vector<std::string> log;
+        _tag_fileindex_err_ error;
+        const char *after;  // null: the file as it was
+        bool lockedByAnother = false;
+    };
+    std::vector<Row> cases = {
+        {marks, "IsUpdated one", "true", quiet, none, nullptr},
+        {marks, "IsUpdated zero", "false", quiet, none, nullptr},
+        {marks, "IsUpdated str", "false", exception, unreadable, nullptr},
+        {marks, "SetUpdated str", "true", quiet, none, R"({"one":1,"zero":0,"str":true})"},
+        {marks, "Pause", "true", quiet, none, R"({"one":1,"zero":0,"str":"x","resume_time":0})"},
+        {marks, "ShareSetNoSpace on", "true", quiet, none,
+         R"({"one":1,"zero":0,"str":"x","no_space":{"photo":true}})"},
+        {marks, "ShareRevive photo", "true", quiet, none, R"({"one":1,"zero":0,"str":"x","no_space":null})"},
+        {noSpaceList, "ShareSetNoSpace on", "false", exception, unreadable, nullptr},
+        {noSpaceList, "ShareRevive photo", "false", exception, unreadable, nullptr},
+        {noSpaceList, "ShareIsNoSpace photo", "false", quiet, none, nullptr},
+        {noSpaceList, "IsUpdated no_space", "false", exception, unreadable, nullptr},
+        {noSpaceList, "ShareSetNeedReindex on", "true", quiet, none,
+         R"({"no_space":[],"need_reindex":{"music":true,"photo":true},"resume_time":0})"},
+        {noSpaceList, "Resume", "true", quiet, none,
+         R"({"no_space":[],"need_reindex":{"music":true},"resume_time":-1})"},
+        {noSpaceList, "GetPauseInfo", "true 0", quiet, none, nullptr},
+        {marks, "Resume", "false", {"Failed to lock folder"}, FILEIDX_ERR_LOCK, nullptr, true},
+        {noSpaceList, "GetPauseInfo", "true 0", quiet, none, nullptr, true},
+        {noSpaceList, "ShareIsNeedReindex music", "true", quiet, none, nullptr, true},
+        {reindexNumber, "ShareSetNeedReindex off", "false", exception, unreadable, nullptr},
+        {reindexNumber, "IsUpdated need_reindex", "true", quiet, none, nullptr},
+        // Clearing a mark that was never set leaves a null, which marks no share.
+        {"", "ShareSetNeedReindex off", "true", quiet, none, R"({"need_reindex":null})"},
+        {"", "GetPauseInfo", "true -1", quiet, none, nullptr},
+        // What the library itself writes, and integral numbers however spelt.
+        {R"({"resume_time":1.7e9,"no_space":null,"need_reindex":{"a":true},"n":null})", "GetPauseInfo",
+         "true 1700000000", quiet, none, nullptr},
+        {R"({"resume_time":"abc"})", "GetPauseInfo", "false 42", exception, none, nullptr},
+        {R"({"resume_time":{}})", "ShareSetNoSpace off", "true", quiet, none, R"({"resume_time":{},"no_space":null})"},
+    };
+    for (const char *document : {"{\"resume_time\":", "0", "[]", "null", "\"x\""}) {
+        for (const auto &operation : operations) {
+            const std::string answer = operation.first == "GetPauseInfo" ? "false 42" : "false";
+            cases.push_back({document, operation.first + " photo", answer, {"Failed to load json from " + kStatusConf},
+                             unreadable, nullptr});
+        }
+    }
+    for (const Row &c : cases) {
+        SCOPED_TRACE(c.document + " " + c.operation);
         stdfs::remove(kStatusConf);
-        if (c.document != nullptr) {
+        if (!c.document.empty()) {
             WriteFile(kStatusConf, c.document);
         }
+        FrameListener daemon;
+        const auto other = c.lockedByAnother ? std::make_unique<LockHolder>(kStatusLock, true) : nullptr;
         LogCapture::Clear();
-        long long resumeTime = 42;
-        EXPECT_EQ(StatusMgr::GetPauseInfo(resumeTime), c.read);
-        EXPECT_EQ(resumeTime, c.resumeTime);
-        EXPECT_EQ(LogCapture::Messages(), c.read ? std::vector<std::string>{} : std::vector<std::string>{"json exception"});
-        EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_NONE);
-        EXPECT_TRUE(StatusMgr::ShareSetNoSpace("photo", false));
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        resumeTime = 42;
+        const size_t space = c.operation.find(' ');
+        const std::string name = c.operation.substr(0, space);
+        const bool result = operations.at(name)(space == std::string::npos ? "" : c.operation.substr(space + 1));
+        EXPECT_EQ((result ? "true" : "false") + (name == "GetPauseInfo" ? " " + std::to_string(resumeTime) : ""),
+                  c.answer);
+        EXPECT_EQ(LogCapture::Messages(), c.log);
+        EXPECT_EQ(ErrorHandler::GetError(), c.error);
+        if (c.after == nullptr) {
+            EXPECT_EQ(ReadFile(kStatusConf), c.document);
+        } else {
+            EXPECT_EQ(Stored(), ParseJson(c.after));
+        }
+        EXPECT_EQ(IsLockHeld(kStatusLock), c.lockedByAnother);
+        if (!result) {
+            ExpectNothingSent(daemon);
+        }
     }
 }
 
@@ -205,21 +256,6 @@ TEST_F(StatusTest, CommandIsSentAfterTheSaveWhileTheStatusLockIsHeld)
 }
 
 // A writer that meets another's lock fails and tells the daemon nothing; readers take no lock.
-TEST_F(StatusTest, WritersFailOnAHeldLockWhileReadersGoOn)
-{
-    const std::string document = R"({"resume_time":0,"no_space":{"photo":true}})";
-    WriteFile(kStatusConf, document);
-    FrameListener daemon;
-    LockHolder other(kStatusLock, true);
-    EXPECT_FALSE(StatusMgr::Resume());
-    EXPECT_EQ(ErrorHandler::GetError(), FILEIDX_ERR_LOCK);
-    ExpectNothingSent(daemon);
-    EXPECT_EQ(ReadFile(kStatusConf), document);
-    long long resumeTime = 42;
-    EXPECT_TRUE(StatusMgr::GetPauseInfo(resumeTime) && StatusMgr::ShareIsNoSpace("photo"));
-    EXPECT_EQ(resumeTime, 0);
-}
-
 TEST_F(StatusTest, SpaceIsShortOnlyForAnUnknownShareOrADefiniteShortage)
 {
     // The quota test's answer 0 with its error: 0x2900 space short, 0x2400 quota short, others unsure.
@@ -298,6 +334,7 @@ TEST_F(ProgressTest, FolderIsPendingOnlyForEventsOnItOrInsideIt)
     }
 }
 
+// An out-of-space share is answered before its queue is read: the torn line in it is not logged.
 TEST_F(ProgressTest, PendingWorkReadsAsThePauseStateAllows)
 {
     const long long now = time(nullptr);
@@ -313,22 +350,16 @@ TEST_F(ProgressTest, PendingWorkReadsAsThePauseStateAllows)
         {R"({"resume_time":"abc"})", "processing", nullptr},
         {R"({"no_space":{"photo":true}})", "err_no_space", "processing"},
     };
-    WriteQueue("photo", Record(1, "/volume1/photo/folder/a"));
+    WriteQueue("photo", "half a line\n" + Record(1, "/volume1/photo/folder/a"));
     for (const auto &c : cases) {
         WriteFile(FILEINDEX_STATUS_CONF_PATH, c.status);
+        LogCapture::Clear();
         EXPECT_EQ(StatusMgr::GetFolderStatus("/photo/folder"), c.folderWord) << c.status;
+        EXPECT_EQ(LogCapture::Lines().empty(), std::string(c.folderWord) == "err_no_space") << c.status;
         std::string overall = "untouched";
         EXPECT_EQ(StatusMgr::GetStatus(overall), c.overallWord != nullptr) << c.status;
         EXPECT_EQ(overall, c.overallWord != nullptr ? c.overallWord : "untouched") << c.status;
     }
-}
-
-TEST_F(ProgressTest, NoSpaceIsAnsweredBeforeTheQueueIsRead)
-{
-    WriteFile(FILEINDEX_STATUS_CONF_PATH, R"({"no_space":{"photo":true}})");
-    WriteQueue("photo", "half a line");
-    EXPECT_EQ(StatusMgr::GetFolderStatus("/photo/folder"), "err_no_space");
-    EXPECT_TRUE(LogCapture::Lines().empty());
 }
 
 TEST_F(ProgressTest, OverallStatusCountsQueueFilesOfIndexableFoldersOnly)

@@ -21,22 +21,24 @@ public:
     // "/usr/vexo/etc/fileindex/status.conf" and "/tmp/fileidx_cfg_status.lock".
     std::string GetPath() const override;
     std::string GetLockPath() const override;
-    // Config::LoadJson, then the layout above is checked: a top level that is not an object,
-    // "no_space" or "need_reindex" neither an object nor null, a "resume_time" that is not a
-    // 64-bit integer, or an updated mark that does not read as a boolean (a string, an array, an
-    // object) is refused like an unreadable file: false, error 6 (FILEIDX_ERR_LOAD_CONFIG),
-    // "Failed to load json from <path>". Save is Config::SaveJson.
+    // Config::LoadJson; a top level that is not an object is refused like an unreadable file: false,
+    // error 6 (FILEIDX_ERR_LOAD_CONFIG), "Failed to load json from <path>". Members of other types
+    // are loaded as they are: only an operation that cannot read the member it touches fails, with
+    // "json exception", error 6, and the document unchanged. Save is Config::SaveJson.
     bool Load() override;
     bool Save() override;
 
     // Sets the top-level member name to true. There is no way to clear it.
     bool SetUpdated(const std::string &name);
-    // True when the member exists and the JSON library reads it as true. A member it cannot read as
-    // a boolean ("no_space", "need_reindex", a text) is no updated mark: false.
+    // True when the member exists and the JSON library reads it as true (true, a number but 0). A
+    // member it cannot read as a boolean (a text, an array, an object such as "no_space") fails:
+    // false, "json exception", error 6.
     bool IsUpdated(const std::string &name);
 
     // Adds or removes share in "need_reindex". Removing from an absent object leaves
-    // "need_reindex": null in the document, which marks no share.
+    // "need_reindex": null in the document, which marks no share. A "need_reindex" that is neither
+    // an object nor null fails: false, "json exception", error 6, document unchanged. The reader
+    // answers true only for a share in an object.
     bool ShareSetNeedReindex(const std::string &share, bool flag);
     bool ShareIsNeedReindex(const std::string &share);
     // As ShareSetNeedReindex for "no_space"; marking a share that was not marked yet also tells
@@ -57,7 +59,8 @@ public:
 // attempts), loads, changes, saves, sends its daemon command while still holding the lock, and
 // unlocks on every path. A failed send logs "SendCammandToDaemon failed" and answers false; the
 // saved change stays. Reading operations load without the lock and answer false when status.conf
-// cannot be read or has the wrong layout (see Status::Load); no operation throws.
+// cannot be read. A member of the wrong type fails only the operations that touch it, as Status
+// says, and nothing is saved or sent then; no operation throws.
 class FILEINDEX_EXPORT StatusMgr {
 public:
     static bool SetUpdated(const std::string &name);
