@@ -65,32 +65,33 @@ protected:
     }
 };
 
-// A failing call exits 1 with nothing on standard output and exactly one line on standard error that
-// names the library's error code, what it means and what to try.
+// A failing call prints exactly one line on standard error that says what failed, what it means
+// and what to try, names the library's error code when there is one, and exits with the status of
+// its kind; standard output stays empty, or holds only the error object with --json.
 TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
 {
     WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
     struct Row {
         std::vector<std::string> args;
         bool holdFolderLock;
+        int status;
         std::string line;  // regular expression for the one line on standard error
     } rows[] = {
-        {{"folder", "get", "/photo/b"}, false,
-         "fileindexctl: folder get /photo/b failed: error 4 FILEIDX_ERR_NO_SUCH_FOLDER: the folder is not in the "
-         "folder list; .*folder list.*"},
-        {{"folder", "get", "/photo/a"}, true,
-         "fileindexctl: folder get /photo/a failed: error 9 FILEIDX_ERR_LOCK: another process holds the folder "
-         "list or status lock; retry in a moment"},
-        {{"pause", "--hours", "-1"}, false, "fileindexctl: pause failed: error 1 FILEIDX_ERR_BAD_PARAM: .*"},
-        {{"resume", "--json"}, false,
-         "fileindexctl: resume failed: error 0 FILEIDX_ERR_NONE: the library recorded no reason; the change is "
-         "saved, but fileindexd did not take the command: is the indexing service running\\? .*"},
-        {{"share", "space", "nosuch"}, false, "fileindexctl: share space nosuch failed: error 2 FILEIDX_ERR_PATH: .*"},
-        {{"share", "paths", "nosuch"}, false,
-         "fileindexctl: share paths nosuch failed: error 0 FILEIDX_ERR_NONE: .*not in the share database.*"},
-        {{"folder", "set", "/photo/b", "--audio", "on"}, false, "fileindexctl: folder set /photo/b failed: error 4 .*"},
-        {{"folder", "add", "/nosuch/a"}, false, "fileindexctl: folder add failed: error 1 FILEIDX_ERR_BAD_PARAM: .*"},
-        {{"reindex", "/music"}, false, "fileindexctl: reindex failed: error 0 FILEIDX_ERR_NONE: .*holds no indexed.*"},
+        {{"folder", "get", "/photo/b"}, false, 4,
+         "fileindexctl: folder get /photo/b: the folder is not in the folder list; .*folder list.* "
+         "\\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
+        {{"folder", "get", "/photo/a"}, true, 75,
+         "fileindexctl: folder get /photo/a: another process holds the folder list or status lock; .* "
+         "\\(FILEIDX_ERR_LOCK\\)"},
+        {{"pause", "--hours", "-1"}, false, 1, "fileindexctl: pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"resume"}, false, 1,
+         "fileindexctl: resume: the change is saved, but fileindexd did not take the command: is the indexing "
+         "service running\\? .*"},
+        {{"share", "space", "nosuch"}, false, 4, "fileindexctl: share space nosuch: .* \\(FILEIDX_ERR_PATH\\)"},
+        {{"share", "paths", "nosuch"}, false, 1, "fileindexctl: share paths nosuch: .*not in the share database.*"},
+        {{"folder", "set", "/photo/b", "--audio", "on"}, false, 4, "fileindexctl: folder set /photo/b: .*"},
+        {{"folder", "add", "/nosuch/a"}, false, 1, "fileindexctl: folder add: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"reindex", "/music"}, false, 1, "fileindexctl: reindex: .*holds no indexed.*"},
     };
     for (const Row &row : rows) {
         std::unique_ptr<LockHolder> holder;
@@ -99,9 +100,16 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         }
         const Outcome outcome = Ctl(row.args);
         SCOPED_TRACE(row.line);
-        EXPECT_EQ(outcome.status, 1);
+        EXPECT_EQ(outcome.status, row.status);
         EXPECT_EQ(outcome.out, "");
         EXPECT_TRUE(std::regex_match(outcome.err, std::regex(row.line + "\n"))) << outcome.err;
+        EXPECT_EQ(outcome.err.find("error 0"), std::string::npos);
+        // With --json the same failure is also the error object on standard output.
+        std::vector<std::string> jsonArgs = row.args;
+        jsonArgs.push_back("--json");
+        const Json::Value error = ParseJson(Ctl(jsonArgs).out)["error"];
+        EXPECT_TRUE(std::regex_match(error["message"].asString() + (error["name"].isNull() ? "" : " (" + error["name"].asString() + ")"),
+                                     std::regex(row.line.substr(std::string("fileindexctl: ").size()))));
     }
     // A wrong command line is not the library's failure: status 2, and one line all the same.
     const Outcome usage = Ctl({"folder", "get"});
@@ -110,38 +118,48 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         << usage.err;
 }
 
-// Both output forms carry a path that is not UTF-8, with a quote in it, byte for byte: the table as
-// people read it, and the JSON documents as the library's own records.
+// Paths that are not UTF-8 or hold an escape sequence: the table shows them quoted so that no byte
+// reaches the terminal raw, and the JSON documents are valid UTF-8 with the exact bytes beside each
+// path and name.
 TEST_F(FileindexctlTest, BothOutputFormsKeepThePathBytes)
 {
-    const std::string odd = "/photo/caf\xe9 \"x\"";
-    stdfs::create_directories(SharePath("photo") + "/caf\xe9 \"x\"");
-    Json::Value record = ParseJson(R"({"document": false, "audio": false, "video": false, "photo": true})");
-    record["path"] = odd;
-    record["name"] = "Caf\xe9";
+    const std::string odd = "/photo/caf\xe9 \"x\"", clear = "/photo/\x1b[2J";
     Json::Value conf = ParseJson(R"({"/music": {"path": "/music", "name": "M\u00fcsic", "audio": true}})");
-    conf[odd] = record;
+    for (const std::string &path : {odd, clear}) {
+        stdfs::create_directories(SharePath("photo") + path.substr(6));
+        conf[path]["name"] = path == odd ? "Caf\xe9" : "\x1b[2J";
+        conf[path]["photo"] = true;
+    }
     WriteFile(kFolderConf, VEXO::FILEINDEX::toString(conf));
 
     const Outcome table = Ctl({"folder", "list", "--with", "is_valid"});
-    EXPECT_EQ(table.out, "PATH             NAME   MEDIA  VALID\n"
-                         "/music           M\u00fcsic  audio  yes\n"
-                         "/photo/caf\xe9 \"x\"  Caf\xe9   photo  yes\n"
-                         "2 of 2 folders\n");
+    EXPECT_EQ(table.out, "PATH                   NAME        MEDIA  VALID\n"
+                         "/music                 M\u00fcsic       audio  yes\n"
+                         "$'/photo/\\e[2J'        $'\\e[2J'    photo  yes\n"
+                         "$'/photo/caf\\xe9 \"x\"'  $'Caf\\xe9'  photo  yes\n"
+                         "3 of 3 folders\n");
     const Outcome json = Ctl({"folder", "list", "--with", "is_valid", "--json"});
-    record["additional"]["is_valid"] = true;
-    EXPECT_EQ(ParseJson(json.out)["folder"][1], record);
-    EXPECT_NE(json.out.find("\"/photo/caf\xe9 \\\"x\\\"\""), std::string::npos) << json.out;  // raw, not \u00e9
+    EXPECT_EQ(ParseJson(json.out)["folders"][2],
+              ParseJson(R"({"path": "/photo/caf\\xe9 \"x\"", "path_bytes": "/photo/caf%E9%20%22x%22",
+                            "name": "Caf\\xe9", "name_bytes": "Caf%E9", "document": false, "audio": false,
+                            "video": false, "photo": true, "additional": {"is_valid": true}})"));
+    EXPECT_EQ(json.out.find_first_of("\xe9\x1b"), std::string::npos) << json.out;
 
     const Outcome check = Ctl({"check", odd, "/photo/#recycle", "/nosuch/a", "--json"});
     const Json::Value checks = ParseJson(check.out);
-    EXPECT_EQ(check.status, 0);
-    EXPECT_EQ(checks[0]["path"], odd);
+    EXPECT_EQ(checks[0]["path_bytes"], "/photo/caf%E9%20%22x%22");
+    EXPECT_EQ(checks[0]["full_path_bytes"], "/" + SharePath("photo").substr(1) + "/caf%E9%20%22x%22");
     EXPECT_EQ(checks[0]["indexed"], true);
     EXPECT_EQ(checks[1]["refusal"], "recycle_bin");
     EXPECT_EQ(checks[1]["crawler_skips"], true);
     EXPECT_EQ(checks[2]["refusal"], "path_unresolved");
-    EXPECT_TRUE(checks[2]["crawler_skips"].isNull());
+    EXPECT_TRUE(checks[2]["full_path_bytes"].isNull());
+
+    // Every path comes back in through its "path_bytes": this pipeline removes each folder.
+    const std::string ctl = FILEINDEXCTL;
+    EXPECT_EQ(std::system((ctl + " folder list --json | jq -r '.folders[].path_bytes' | xargs " + ctl +
+                           " folder remove --path-bytes >/dev/null").c_str()), 0);
+    EXPECT_EQ(ReadFile(kFolderConf), "{}");
 }
 
 // The first folder starts the stand-in daemon through the service start; status --watch --json
@@ -160,11 +178,13 @@ TEST_F(FileindexctlTest, FolderAddedIsIndexedWhileWatchedAndRemovedAgain)
 
     const Outcome added = Ctl({"folder", "add", "/photo", "--photo", "--json"});
     EXPECT_EQ(added.status, 0) << added.err;
-    EXPECT_EQ(ParseJson(added.out), ParseJson(R"([{"path": "/photo", "name": "photo", "document": false,
-                                                   "audio": false, "video": false, "photo": true}])"));
+    EXPECT_EQ(ParseJson(added.out), ParseJson(R"([{"path": "/photo", "path_bytes": "/photo", "name": "photo",
+                                                   "name_bytes": "photo", "document": false, "audio": false,
+                                                   "video": false, "photo": true}])"));
     const Outcome watched = Ctl({"status", "--watch", "--interval", "0.05", "--json"});
-    EXPECT_EQ(ParseJson(watched.out), ParseJson(R"({"status": "finished", "resume_time": -1,
-                                                     "folder": {"/photo": "finished"}})"));
+    const Json::Value report = ParseJson(watched.out);
+    EXPECT_EQ(report["status"], "finished");
+    EXPECT_EQ(report["folders"], ParseJson(R"([{"path": "/photo", "path_bytes": "/photo", "status": "finished"}])"));
     EXPECT_EQ(ReadFile(frames), "{\"data\":{\"folder_path\":\"/photo\"},\"type\":\"upsert_folder_setting\"}\n");
     EXPECT_NE(ReadFile(SharePath("photo") + "/@eaDir/VEXO@.fileindexdb/index.jsonl").find("131072"),
               std::string::npos);

@@ -6,13 +6,17 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
 #include <CLI/CLI.hpp>
+
+#include "failure.h"
 
 namespace fileindexctl {
 
 struct Context {
     bool json = false;               // --json: one JSON document instead of tables
+    bool pathBytes = false;          // --path-bytes: path arguments are percent-encoded bytes
     std::function<int()> action;     // the chosen subcommand; returns the exit status
 };
 
@@ -20,6 +24,15 @@ struct Context {
 // action when the command line chooses it.
 CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name, const std::string &description,
                      std::function<int()> run);
+
+// Adds the PATH arguments of a subcommand, and the --path-bytes flag that reads them as
+// percent-encoded bytes (path_encoding.h).
+CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::string> &paths,
+                      const std::string &description);
+// The path arguments as the library takes them: decoded under --path-bytes. False, with the
+// failure (kInvalid), for an argument that is not percent-encoded text.
+bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
+               fileindex_tool::Failure &failure);
 
 void AddFolderCommands(CLI::App &app, Context &context);
 void AddIndexCommands(CLI::App &app, Context &context);

@@ -6,19 +6,28 @@
 #include <vector>
 
 #include "commands.h"
+#include "failure.h"
 #include "fileindex/index_mgr.h"
+#include "folder_output.h"
 #include "output.h"
+#include "path_encoding.h"
 #include "records.h"
 
 namespace fileindexctl {
 
+using fileindex_tool::ClearLastError;
+using fileindex_tool::Failure;
+using fileindex_tool::LibraryFailure;
+using fileindex_tool::TerminalText;
 using VEXO::FILEINDEX::Folder;
 using VEXO::FILEINDEX::IndexMgr;
 
 namespace {
 
-const char kFollowUpHint[] = "a step that sets no code failed (an empty path, or after folder.conf was saved: change "
-                             "monitoring, the service start, a daemon command, an event); the system log names it";
+const char kFollowUpHint[] = "a step that sets no error code failed (an empty path, or after folder.conf was saved: "
+                             "change monitoring, the service start, a daemon command, an event); the system log "
+                             "names it";
+const char kReadHint[] = "the library recorded no reason; the system log has its line";
 
 constexpr std::array<const char *, 4> kMedia = {"document", "audio", "video", "photo"};
 
@@ -69,56 +78,69 @@ int ShowStored(const Context &context, const std::string &what, const std::strin
 {
     std::vector<Folder> folders;
     if (!ListFolders(folders)) {
-        return Fail(what);
+        return Report(context, LibraryFailure(what, kReadHint));
     }
-    const Json::Value records = RecordsOf(folders, paths);
+    const std::vector<Folder> stored = FoldersAt(folders, paths);
     if (context.json) {
-        PrintJson(records);
+        PrintJson(fileindex_tool::FolderRecords(stored));
     } else {
-        PrintRecordLines(verb, records);
+        PrintFolderLines(verb, stored);
     }
     return kSuccess;
 }
 
-int Add(const Context &context, const SettingOptions &options)
+int Add(const Context &context, SettingOptions &options)
 {
+    Failure failure;
+    if (!TakePaths(context, "folder add", options.paths, failure)) {
+        return Report(context, failure);
+    }
     ClearLastError();
     if (!IndexMgr::Add(SettingRequest(options, true))) {
-        return Fail("folder add", kFollowUpHint);
+        return Report(context, LibraryFailure("folder add", kFollowUpHint));
     }
     return ShowStored(context, "folder add", "added", options.paths);
 }
 
 // Changes what the command line gives of a folder already in the list; an unknown path fails with
 // the library's FILEIDX_ERR_NO_SUCH_FOLDER instead of being added.
-int Set(const Context &context, const SettingOptions &options)
+int Set(const Context &context, SettingOptions &options)
 {
+    Failure failure;
+    if (!TakePaths(context, "folder set", options.paths, failure)) {
+        return Report(context, failure);
+    }
     ClearLastError();
     Json::Value record;
+    const std::string what = "folder set " + TerminalText(options.paths.front());
     if (!IndexMgr::Get(record, options.paths.front())) {
-        return Fail("folder set " + options.paths.front());
+        return Report(context, LibraryFailure(what, kReadHint));
     }
     if (!IndexMgr::Set(SettingRequest(options, false))) {
-        return Fail("folder set " + options.paths.front(), kFollowUpHint);
+        return Report(context, LibraryFailure(what, kFollowUpHint));
     }
     return ShowStored(context, "folder set", "changed", options.paths);
 }
 
-int Remove(const Context &context, const std::vector<std::string> &paths)
+int Remove(const Context &context, std::vector<std::string> &paths)
 {
+    Failure failure;
+    if (!TakePaths(context, "folder remove", paths, failure)) {
+        return Report(context, failure);
+    }
     ClearLastError();
     std::vector<Folder> before;
     if (!ListFolders(before)) {
-        return Fail("folder remove");
+        return Report(context, LibraryFailure("folder remove", kReadHint));
     }
     if (!IndexMgr::Delete(PathArray(paths))) {
-        return Fail("folder remove", kFollowUpHint);
+        return Report(context, LibraryFailure("folder remove", kFollowUpHint));
     }
-    const Json::Value removed = RecordsOf(before, paths);
+    const std::vector<Folder> removed = FoldersAt(before, paths);
     if (context.json) {
-        PrintJson(removed);
+        PrintJson(fileindex_tool::FolderRecords(removed));
     } else {
-        PrintRecordLines("removed", removed);
+        PrintFolderLines("removed", removed);
         if (removed.size() < paths.size()) {
             std::cout << paths.size() - removed.size() << " of the paths were not in the folder list\n";
         }
@@ -144,10 +166,10 @@ int List(const Context &context, const ListOptions &options)
     Json::Value page;
     if (!IndexMgr::List(page, options.offset, options.limit, options.sortBy, options.descending ? "DESC" : "",
                         additional)) {
-        return Fail("folder list");
+        return Report(context, LibraryFailure("folder list", kReadHint));
     }
     if (context.json) {
-        PrintJson(page);
+        PrintJson(fileindex_tool::FolderPage(page));
         return kSuccess;
     }
     std::vector<std::string> header{"PATH", "NAME", "MEDIA"};
@@ -156,7 +178,8 @@ int List(const Context &context, const ListOptions &options)
     }
     Table table(header);
     for (const Json::Value &record : page["folder"]) {
-        std::vector<std::string> row{record["path"].asString(), record["name"].asString(), MediaText(record)};
+        std::vector<std::string> row{TerminalText(record["path"].asString()), TerminalText(record["name"].asString()),
+                                     MediaText(record)};
         for (const std::string &key : options.additional) {
             const Json::Value &value = record["additional"][key];
             row.push_back(value.isBool() ? YesNo(value.asBool()) : value.asString());
@@ -172,17 +195,22 @@ int List(const Context &context, const ListOptions &options)
     return kSuccess;
 }
 
-int Get(const Context &context, const std::string &path)
+int Get(const Context &context, std::vector<std::string> &paths)
 {
+    Failure failure;
+    if (!TakePaths(context, "folder get", paths, failure)) {
+        return Report(context, failure);
+    }
+    const std::string &path = paths.front();
     ClearLastError();
     Json::Value record;
     if (!IndexMgr::Get(record, path)) {
-        return Fail("folder get " + path);
+        return Report(context, LibraryFailure("folder get " + TerminalText(path), kReadHint));
     }
     if (context.json) {
-        PrintJson(record);
+        PrintJson(fileindex_tool::FolderRecord(record));
     } else {
-        PrintRecord(record);
+        PrintFolder(record);
     }
     return kSuccess;
 }
@@ -199,10 +227,10 @@ void AddSettingCommand(CLI::App &folder, Context &context, bool adding)
                : AddCommand(folder, context, "set", "change the name or media of an indexed folder",
                             [&context, options]() { return Set(context, *options); });
     if (adding) {
-        command->add_option("PATH", options->paths, "share-relative paths, /<share>/<folder>")->required();
+        AddPaths(*command, context, options->paths, "share-relative paths, /<share>/<folder>")->required();
         options->nameGiven = command->add_option("--name", options->name, "display name (default: the folder's name)");
     } else {
-        command->add_option("PATH", options->paths, "share-relative path of an indexed folder")
+        AddPaths(*command, context, options->paths, "share-relative path of an indexed folder")
             ->required()
             ->expected(1);
         options->nameGiven = command->add_option("--name", options->name, "display name");
@@ -237,21 +265,22 @@ void AddFolderCommands(CLI::App &app, Context &context)
         ->delimiter(',')
         ->check(CLI::IsMember({"status", "is_valid"}));
 
-    auto path = std::make_shared<std::string>();
-    AddCommand(*folder, context, "get", "show one folder's setting (read under the folder lock)",
-               [&context, path]() { return Get(context, *path); })
-        ->add_option("PATH", *path, "share-relative path of an indexed folder, /<share>/<folder>")
-        ->required();
+    auto path = std::make_shared<std::vector<std::string>>();
+    CLI::App *get = AddCommand(*folder, context, "get", "show one folder's setting (read under the folder lock)",
+                               [&context, path]() { return Get(context, *path); });
+    AddPaths(*get, context, *path, "share-relative path of an indexed folder, /<share>/<folder>")
+        ->required()
+        ->expected(1);
 
     AddSettingCommand(*folder, context, true);
     AddSettingCommand(*folder, context, false);
 
     auto paths = std::make_shared<std::vector<std::string>>();
-    AddCommand(*folder, context, "remove",
-               "stop indexing folders; the last one stops fileindexd, a share's last one wipes its index",
-               [&context, paths]() { return Remove(context, *paths); })
-        ->add_option("PATH", *paths, "share-relative paths of indexed folders")
-        ->required();
+    CLI::App *remove =
+        AddCommand(*folder, context, "remove",
+                   "stop indexing folders; the last one stops fileindexd, a share's last one wipes its index",
+                   [&context, paths]() { return Remove(context, *paths); });
+    AddPaths(*remove, context, *paths, "share-relative paths of indexed folders")->required();
 }
 
 }  // namespace fileindexctl

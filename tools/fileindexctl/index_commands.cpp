@@ -4,51 +4,33 @@
 #include <string>
 #include <vector>
 
+#include "check_report.h"
 #include "commands.h"
+#include "failure.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
+#include "folder_output.h"
 #include "output.h"
+#include "path_encoding.h"
 #include "records.h"
 
 namespace fileindexctl {
 
 using namespace VEXO::FILEINDEX;
+using fileindex_tool::ClearLastError;
+using fileindex_tool::Failure;
+using fileindex_tool::LibraryFailure;
+using fileindex_tool::TerminalText;
 
 namespace {
 
-// Whether the path is indexed or holds indexed folders, and which rules, if any, refuse it as a
-// folder to index and as an entry the crawler meets (the crawler's answer is null for a path that
-// does not resolve): the library's own rules and their words.
-Json::Value CheckPath(const std::string &path)
+// The check report of path, for people.
+void PrintCheck(const std::string &path, const Json::Value &check)
 {
-    Json::Value check;
-    check["path"] = path;
+    std::cout << TerminalText(path) << "\n";
     std::string fullPath;
-    const bool resolved = GetFullPath(fullPath, path);
-    check["full_path"] = resolved ? Json::Value(fullPath) : Json::Value();
-    check["indexed"] = IndexMgr::IsPathIndexed(path);
-    check["contains_indexed"] = IndexMgr::IsPathContainIndexed(path);
-    const IndexRefusal refusal = GetPathIndexRefusal(path);
-    check["may_be_indexed"] = refusal == IndexRefusal::kNone;
-    check["refusal"] = IndexRefusalName(refusal);
-    check["refusal_text"] = IndexRefusalText(refusal);
-    check["crawler_skips"] = Json::Value();
-    check["skip_refusal"] = Json::Value();
-    check["skip_refusal_text"] = Json::Value();
-    if (resolved) {
-        const IndexRefusal skip = GetSkipIndexRefusal(fullPath);
-        check["crawler_skips"] = skip != IndexRefusal::kNone;
-        check["skip_refusal"] = IndexRefusalName(skip);
-        check["skip_refusal_text"] = IndexRefusalText(skip);
-    }
-    return check;
-}
-
-void PrintCheck(const Json::Value &check)
-{
-    std::cout << check["path"].asString() << "\n";
-    if (!check["full_path"].isNull()) {
-        std::cout << "  full path:       " << check["full_path"].asString() << "\n";
+    if (check["full_path_bytes"].isString() && fileindex_tool::PercentDecode(check["full_path_bytes"].asString(), fullPath)) {
+        std::cout << "  full path:       " << TerminalText(fullPath) << "\n";
     }
     std::cout << "  indexed:         "
               << (check["indexed"].asBool()            ? "yes"
@@ -65,35 +47,50 @@ void PrintCheck(const Json::Value &check)
     }
 }
 
-int Check(const Context &context, const std::vector<std::string> &paths)
+int Check(const Context &context, std::vector<std::string> &paths)
 {
+    Failure failure;
+    if (!TakePaths(context, "check", paths, failure)) {
+        return Report(context, failure);
+    }
     Json::Value checks(Json::arrayValue);
     for (const std::string &path : paths) {
-        checks.append(CheckPath(path));
+        checks.append(fileindex_tool::CheckReport(path));
     }
     if (context.json) {
         PrintJson(checks);
         return kSuccess;
     }
-    for (const Json::Value &check : checks) {
-        PrintCheck(check);
+    for (Json::ArrayIndex i = 0; i < checks.size(); ++i) {
+        PrintCheck(paths[i], checks[i]);
     }
     return kSuccess;
 }
 
-int Reindex(const Context &context, const std::vector<std::string> &paths)
+int Reindex(const Context &context, std::vector<std::string> &paths)
 {
+    Failure failure;
+    if (!TakePaths(context, "reindex", paths, failure)) {
+        return Report(context, failure);
+    }
     const Json::Value request = PathArray(paths);
     ClearLastError();
     if (!IndexMgr::Reindex(request)) {
-        return Fail("reindex", "a path's share holds no indexed folder (which logs nothing), or an event could not "
-                               "be queued (the system log names it)");
+        return Report(context, LibraryFailure("reindex", "a path's share holds no indexed folder (which logs "
+                                                         "nothing), or an event could not be queued (the system log "
+                                                         "names it)"));
     }
     if (context.json) {
-        PrintJson(request);
+        Json::Value queued(Json::arrayValue);
+        for (const std::string &path : paths) {
+            Json::Value entry;
+            fileindex_tool::SetBytesMember(entry, "path", path);
+            queued.append(entry);
+        }
+        PrintJson(queued);
     } else {
         for (const std::string &path : paths) {
-            std::cout << "reindex queued for " << path << "\n";
+            std::cout << "reindex queued for " << TerminalText(path) << "\n";
         }
     }
     return kSuccess;
@@ -103,20 +100,20 @@ int Upgrade(const Context &context)
 {
     ClearLastError();
     if (!Updater_hvx60_beta2()) {
-        return Fail("upgrade", "a step (the service, Spotlight, change monitoring or the reindex) failed; the "
-                               "system log names it");
+        return Report(context, LibraryFailure("upgrade", "a step (the service, Spotlight, change monitoring or the "
+                                                         "reindex) failed; the system log names it"));
     }
     std::vector<Folder> folders;
     if (!ListFolders(folders)) {
-        return Fail("upgrade");
+        return Report(context, LibraryFailure("upgrade", "the library recorded no reason; the system log has its "
+                                                         "line"));
     }
-    const Json::Value records = RecordsOf(folders);
     if (context.json) {
-        PrintJson(records);
+        PrintJson(fileindex_tool::FolderRecords(folders));
     } else if (folders.empty()) {
         std::cout << "nothing is indexed: fileindexd stopped\n";
     } else {
-        PrintRecordLines("monitored and queued for reindex:", records);
+        PrintFolderLines("monitored and queued for reindex:", folders);
     }
     return kSuccess;
 }
@@ -126,17 +123,17 @@ int Upgrade(const Context &context)
 void AddIndexCommands(CLI::App &app, Context &context)
 {
     auto paths = std::make_shared<std::vector<std::string>>();
-    AddCommand(app, context, "check",
-               "is a path indexed, does it hold indexed folders, may it be indexed, and which rule refuses it",
-               [&context, paths]() { return Check(context, *paths); })
-        ->add_option("PATH", *paths, "share-relative paths, /<share>/<folder>")
-        ->required();
+    CLI::App *check =
+        AddCommand(app, context, "check",
+                   "is a path indexed, does it hold indexed folders, may it be indexed, and which rule refuses it",
+                   [&context, paths]() { return Check(context, *paths); });
+    AddPaths(*check, context, *paths, "share-relative paths, /<share>/<folder>")->required();
 
     auto reindexPaths = std::make_shared<std::vector<std::string>>();
-    AddCommand(app, context, "reindex",
-               "index folders again from scratch (reviving shares that ran out of space)",
-               [&context, reindexPaths]() { return Reindex(context, *reindexPaths); })
-        ->add_option("PATH", *reindexPaths, "share-relative paths in shares that hold indexed folders")
+    CLI::App *reindex = AddCommand(app, context, "reindex",
+                                   "index folders again from scratch (reviving shares that ran out of space)",
+                                   [&context, reindexPaths]() { return Reindex(context, *reindexPaths); });
+    AddPaths(*reindex, context, *reindexPaths, "share-relative paths in shares that hold indexed folders")
         ->required();
 
     AddCommand(app, context, "upgrade",

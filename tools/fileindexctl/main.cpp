@@ -1,13 +1,13 @@
 // fileindexctl: shows and changes the appliance's file index through libfileindex's exported
-// interface. Tables for people by default, one JSON document with --json; exit status 0 on
-// success, 1 with one line on standard error naming the library's error code when a call fails,
-// 2 when the command line is wrong.
+// interface. Tables for people by default, one JSON document with --json; a failure is one line on
+// standard error (and the error object with --json) and an exit status of its kind (output.h).
 #include <string>
 
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
 #include "output.h"
+#include "path_encoding.h"
 
 namespace fileindexctl {
 
@@ -15,9 +15,35 @@ CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name
                      std::function<int()> run)
 {
     CLI::App *command = parent.add_subcommand(name, description);
-    command->add_flag("--json", context.json, "print one JSON document: the library's own records");
+    command->add_flag("--json", context.json, "print one JSON document (docs/fileindexctl.md gives each shape)");
     command->callback([&context, run]() { context.action = run; });
     return command;
+}
+
+CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::string> &paths,
+                      const std::string &description)
+{
+    command.add_flag("--path-bytes", context.pathBytes,
+                     "read each PATH as percent-encoded bytes, the \"path_bytes\" form of the JSON records");
+    return command.add_option("PATH", paths, description);
+}
+
+bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
+               fileindex_tool::Failure &failure)
+{
+    if (!context.pathBytes) {
+        return true;
+    }
+    for (std::string &path : paths) {
+        if (!fileindex_tool::PercentDecode(path, path)) {
+            failure = fileindex_tool::ToolFailure(
+                fileindex_tool::FailureKind::kInvalid, fileindex_tool::Failure::kNoCode,
+                what + ": " + fileindex_tool::TerminalText(path) + " is not percent-encoded (a \"%\" must be "
+                "followed by two hex digits); --path-bytes takes the \"path_bytes\" form of the JSON records");
+            return false;
+        }
+    }
+    return true;
 }
 
 }  // namespace fileindexctl
@@ -37,7 +63,8 @@ int main(int argc, char **argv)
     app.footer("Every subcommand takes --json and has its own --help. Paths are share-relative, /<share>/<folder>, "
                "unless a subcommand says otherwise.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
-               "code and what to try), 2 wrong command line.");
+               "code and what to try), 2 wrong command line, 4 no such share, path or folder, 75 a lock stayed "
+               "busy.");
 
     Context context;
     AddFolderCommands(app, context);

@@ -1,5 +1,5 @@
 // What fileindexctl prints: tables and lines for people, one JSON document for scripts, and the
-// one line on standard error that names the library's error code when a call fails.
+// report of a failure, with the exit statuses that tell failures apart.
 #ifndef FILEINDEXCTL_OUTPUT_H
 #define FILEINDEXCTL_OUTPUT_H
 
@@ -9,19 +9,31 @@
 
 #include <json/value.h>
 
+#include "commands.h"
+#include "failure.h"
+
 namespace fileindexctl {
 
 // Exit statuses.
 constexpr int kSuccess = 0;
-constexpr int kFailure = 1;      // a library call failed; its error line is on standard error
-constexpr int kUsage = 2;        // the command line was wrong
+constexpr int kFailure = 1;         // a library call failed
+constexpr int kUsage = 2;           // the command line is wrong, or a path or value in it
+constexpr int kRefused = 3;         // check: a path may not be indexed; folder add/set: refused for that
+constexpr int kNotFound = 4;        // no such share, path or folder
+constexpr int kDaemonNotTold = 5;   // the change is saved, but fileindexd did not take the command
+constexpr int kBusy = 75;           // a lock stayed busy until --wait ran out (sysexits' EX_TEMPFAIL)
 constexpr int kInterrupted = 130;
 
-// One JSON document on standard output, indented, string bytes copied raw (paths that are not
-// valid UTF-8 come out as they are stored).
+// One JSON document on standard output, indented. The tool's records hold valid UTF-8 only (byte
+// strings come as the pairs of path_encoding.h).
 void PrintJson(const Json::Value &document);
 
-// Columns aligned to their widest cell, counted in characters of UTF-8 text.
+// Reports the failure: "fileindexctl: <message> (<error code name>)" on standard error (without the
+// name when no code applies) and, with --json, the error object on standard output. Returns the exit status of the failure's kind.
+int Report(const Context &context, const fileindex_tool::Failure &failure);
+
+// Columns aligned to their widest cell, counted in characters of UTF-8 text. Cells that come from
+// files (paths, names) must have gone through TerminalText.
 class Table {
 public:
     explicit Table(std::vector<std::string> header);
@@ -34,18 +46,9 @@ private:
 
 std::string YesNo(bool value);
 
-// Stores FILEIDX_ERR_NONE as the library's last error, so that a failing call that follows leaves
-// its own code there and not one from an earlier failure.
-void ClearLastError();
-
 // What to try when a status change was saved but its daemon command was not taken.
 constexpr char kDaemonHint[] =
     "the change is saved, but fileindexd did not take the command: is the indexing service running? Retry once it is";
-
-// Prints "fileindexctl: <what> failed: error <n> <NAME>: <meaning>; <advice>" on standard error and
-// returns kFailure. When the library recorded no code, hintWithoutCode (if given) stands in for
-// the general advice to read the system log.
-int Fail(const std::string &what, const std::string &hintWithoutCode = std::string());
 
 }  // namespace fileindexctl
 

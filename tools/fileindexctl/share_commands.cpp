@@ -9,25 +9,39 @@
 #include <vector>
 
 #include "commands.h"
+#include "failure.h"
 #include "fileindex/fileidx.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
+#include "folder_output.h"
 #include "output.h"
+#include "path_encoding.h"
 #include "records.h"
 
 namespace fileindexctl {
 
 using namespace VEXO::FILEINDEX;
+using fileindex_tool::ClearLastError;
+using fileindex_tool::LibraryFailure;
+using fileindex_tool::SetBytesMember;
+using fileindex_tool::TerminalText;
 
 namespace {
 
 const char kUnknownShareHint[] = "the share is not in the share database; the system log has the platform's code";
+const char kReadHint[] = "the library recorded no reason; the system log has its line";
+
+// What: "share <subcommand> <share>".
+std::string What(const std::string &subcommand, const std::string &share)
+{
+    return "share " + subcommand + " " + TerminalText(share);
+}
 
 Json::Value ShareDocument(const std::string &share)
 {
     Json::Value document;
-    document["share_name"] = share;
+    SetBytesMember(document, "share_name", share);
     return document;
 }
 
@@ -36,17 +50,15 @@ int Space(const Context &context, const std::string &share)
     ClearLastError();
     std::string fullPath;
     if (!GetFullPath(fullPath, "/" + share)) {
-        return Fail("share space " + share);
+        return Report(context, LibraryFailure(What("space", share), kUnknownShareHint));
     }
-    Json::Value document = ShareDocument(share);
+    Json::Value document = fileindex_tool::ShareMarks(share);
     document["space_enough"] = IsShareSpaceEnough(share);
-    document["no_space"] = StatusMgr::ShareIsNoSpace(share);
-    document["need_reindex"] = StatusMgr::ShareIsNeedReindex(share);
     if (context.json) {
         PrintJson(document);
         return kSuccess;
     }
-    std::cout << "share:          " << share << " at " << fullPath << "\n"
+    std::cout << "share:          " << TerminalText(share) << " at " << TerminalText(fullPath) << "\n"
               << "free space:     " << (document["space_enough"].asBool() ? "enough" : "less than 10 MiB") << "\n"
               << "out of space:   " << (document["no_space"].asBool() ? "marked (revive it once space is free)" : "no")
               << "\n"
@@ -67,17 +79,17 @@ int Paths(const Context &context, const std::string &share)
     char database[4096];
     if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof(queue)) < 0 ||
         FILEIDXDBPathGet(share.c_str(), database, sizeof(database)) < 0) {
-        return Fail("share paths " + share, kUnknownShareHint);
+        return Report(context, LibraryFailure(What("paths", share), kUnknownShareHint));
     }
     Json::Value document = ShareDocument(share);
-    document["queue"] = queue;
-    document["database"] = database;
+    SetBytesMember(document, "queue", queue);
+    SetBytesMember(document, "database", database);
     if (context.json) {
         PrintJson(document);
         return kSuccess;
     }
-    std::cout << "event queue:    " << queue << Presence(queue) << "\n"
-              << "index database: " << database << "\n";
+    std::cout << "event queue:    " << TerminalText(queue) << Presence(queue) << "\n"
+              << "index database: " << TerminalText(database) << "\n";
     return kSuccess;
 }
 
@@ -87,7 +99,7 @@ int Done(const Context &context, const std::string &share, const std::string &li
     if (context.json) {
         PrintJson(ShareDocument(share));
     } else {
-        std::cout << "share " << share << ": " << line << "\n";
+        std::cout << "share " << TerminalText(share) << ": " << line << "\n";
     }
     return kSuccess;
 }
@@ -97,17 +109,16 @@ int Remove(const Context &context, const std::string &share)
     ClearLastError();
     std::vector<Folder> before;
     if (!ListFolders(before, share)) {
-        return Fail("share remove " + share);
+        return Report(context, LibraryFailure(What("remove", share), kReadHint));
     }
     if (!IndexMgr::ShareRemove(share)) {
-        return Fail("share remove " + share);
+        return Report(context, LibraryFailure(What("remove", share), kReadHint));
     }
-    const Json::Value removed = RecordsOf(before);
     if (context.json) {
-        PrintJson(removed);
+        PrintJson(fileindex_tool::FolderRecords(before));
     } else {
-        PrintRecordLines("removed", removed);
-        std::cout << "share " << share << ": folder settings removed: " << removed.size() << "\n";
+        PrintFolderLines("removed", before);
+        std::cout << "share " << TerminalText(share) << ": folder settings removed: " << before.size() << "\n";
     }
     return kSuccess;
 }
@@ -117,14 +128,14 @@ int Rename(const Context &context, const std::string &from, const std::string &t
     ClearLastError();
     std::vector<Folder> after;
     if (!IndexMgr::ShareRename(from, to) || !ListFolders(after, to)) {
-        return Fail("share rename " + from + " " + to);
+        return Report(context, LibraryFailure(What("rename", from) + " " + TerminalText(to), kReadHint));
     }
-    const Json::Value records = RecordsOf(after);
     if (context.json) {
-        PrintJson(records);
+        PrintJson(fileindex_tool::FolderRecords(after));
     } else {
-        PrintRecordLines("now", records);
-        std::cout << "share " << from << " is now " << to << ": folder settings moved: " << records.size() << "\n";
+        PrintFolderLines("now", after);
+        std::cout << "share " << TerminalText(from) << " is now " << TerminalText(to)
+                  << ": folder settings moved: " << after.size() << "\n";
     }
     return kSuccess;
 }
@@ -158,7 +169,7 @@ int RunShareAction(const Context &context, const ShareAction &action, const std:
 {
     ClearLastError();
     if (!action.call(share)) {
-        return Fail(std::string("share ") + action.name + " " + share, action.failureHint);
+        return Report(context, LibraryFailure(What(action.name, share), action.failureHint));
     }
     return Done(context, share, action.doneLine);
 }

@@ -12,14 +12,18 @@
 #include <vector>
 
 #include "commands.h"
-#include "fileindex/index_mgr.h"
+#include "failure.h"
 #include "fileindex/status.h"
 #include "output.h"
+#include "path_encoding.h"
+#include "status_report.h"
 
 namespace fileindexctl {
 
-using VEXO::FILEINDEX::Folder;
-using VEXO::FILEINDEX::IndexMgr;
+using fileindex_tool::ClearLastError;
+using fileindex_tool::LibraryFailure;
+using fileindex_tool::StatusReport;
+using fileindex_tool::TerminalText;
 using VEXO::FILEINDEX::StatusMgr;
 
 namespace {
@@ -50,60 +54,21 @@ struct StatusOptions {
     double interval = 1.0;
 };
 
-// The overall word, the pause state and each folder's word, as the library reports them now.
-struct Snapshot {
-    std::string status;
-    long long resumeTime = -1;
-    std::vector<std::pair<std::string, std::string>> folders;
-};
+const char kReadHint[] = "the library recorded no reason; the system log has its line";
 
-bool TakeSnapshot(const std::vector<std::string> &paths, Snapshot &snapshot)
-{
-    ClearLastError();
-    std::vector<std::string> folders = paths;
-    if (folders.empty()) {
-        std::vector<Folder> list;
-        if (!IndexMgr::List(list)) {
-            return false;
-        }
-        for (const Folder &folder : list) {
-            folders.push_back(folder.m_path);
-        }
-    }
-    if (!StatusMgr::GetStatus(snapshot.status) || !StatusMgr::GetPauseInfo(snapshot.resumeTime)) {
-        return false;
-    }
-    for (const std::string &path : folders) {
-        snapshot.folders.emplace_back(path, StatusMgr::GetFolderStatus(path));
-    }
-    return true;
-}
-
-Json::Value SnapshotJson(const Snapshot &snapshot)
-{
-    Json::Value document;
-    document["status"] = snapshot.status;
-    document["resume_time"] = static_cast<Json::Int64>(snapshot.resumeTime);
-    document["folder"] = Json::Value(Json::objectValue);
-    for (const auto &folder : snapshot.folders) {
-        document["folder"][folder.first] = folder.second;
-    }
-    return document;
-}
-
-std::string SnapshotText(const Snapshot &snapshot)
+std::string ReportText(const StatusReport &report)
 {
     std::ostringstream text;
-    text << "indexing: " << snapshot.status;
-    if (snapshot.resumeTime != -1) {
-        const std::string until = PauseText(snapshot.resumeTime);
-        text << (snapshot.status == "paused" ? " " + until : " (paused " + until + ")");
+    text << "indexing: " << report.status;
+    if (report.resumeTime != -1) {
+        const std::string until = PauseText(report.resumeTime);
+        text << (report.status == "paused" ? " " + until : " (paused " + until + ")");
     }
     text << "\n";
-    if (!snapshot.folders.empty()) {
+    if (!report.folders.empty()) {
         Table table({"FOLDER", "STATUS"});
-        for (const auto &folder : snapshot.folders) {
-            table.Add({folder.first, folder.second});
+        for (const fileindex_tool::FolderState &folder : report.folders) {
+            table.Add({TerminalText(folder.path), folder.status});
         }
         table.Print(text);
     }
@@ -122,11 +87,12 @@ int Watch(const Context &context, const StatusOptions &options)
     const bool terminal = isatty(STDOUT_FILENO) == 1;
     std::string drawn;
     for (;;) {
-        Snapshot snapshot;
-        if (!TakeSnapshot(options.paths, snapshot)) {
-            return Fail("status");
+        StatusReport report;
+        ClearLastError();
+        if (!fileindex_tool::TakeStatusReport(options.paths, report)) {
+            return Report(context, LibraryFailure("status", kReadHint));
         }
-        const std::string text = SnapshotText(snapshot);
+        const std::string text = ReportText(report);
         if (!context.json && text != drawn) {
             if (terminal && !drawn.empty()) {
                 std::cout << "\033[" << std::count(drawn.begin(), drawn.end(), '\n') << "A\033[J";
@@ -136,9 +102,9 @@ int Watch(const Context &context, const StatusOptions &options)
             std::cout << text << std::flush;
             drawn = text;
         }
-        if (snapshot.status == "finished") {
+        if (report.status == "finished") {
             if (context.json) {
-                PrintJson(SnapshotJson(snapshot));
+                PrintJson(fileindex_tool::StatusRecord(report));
             }
             return kSuccess;
         }
@@ -151,19 +117,24 @@ int Watch(const Context &context, const StatusOptions &options)
     }
 }
 
-int Status(const Context &context, const StatusOptions &options)
+int Status(const Context &context, StatusOptions &options)
 {
+    fileindex_tool::Failure failure;
+    if (!TakePaths(context, "status", options.paths, failure)) {
+        return Report(context, failure);
+    }
     if (options.watch) {
         return Watch(context, options);
     }
-    Snapshot snapshot;
-    if (!TakeSnapshot(options.paths, snapshot)) {
-        return Fail("status");
+    StatusReport report;
+    ClearLastError();
+    if (!fileindex_tool::TakeStatusReport(options.paths, report)) {
+        return Report(context, LibraryFailure("status", kReadHint));
     }
     if (context.json) {
-        PrintJson(SnapshotJson(snapshot));
+        PrintJson(fileindex_tool::StatusRecord(report));
     } else {
-        std::cout << SnapshotText(snapshot);
+        std::cout << ReportText(report);
     }
     return kSuccess;
 }
@@ -173,7 +144,7 @@ int ShowPauseState(const Context &context, const std::string &what)
 {
     long long resumeTime = -1;
     if (!StatusMgr::GetPauseInfo(resumeTime)) {
-        return Fail(what);
+        return Report(context, LibraryFailure(what, kReadHint));
     }
     if (context.json) {
         Json::Value document;
@@ -191,7 +162,7 @@ int Pause(const Context &context, int hours)
 {
     ClearLastError();
     if (!StatusMgr::Pause(hours)) {
-        return Fail("pause", kDaemonHint);
+        return Report(context, LibraryFailure("pause", kDaemonHint));
     }
     return ShowPauseState(context, "pause");
 }
@@ -200,7 +171,7 @@ int Resume(const Context &context)
 {
     ClearLastError();
     if (!StatusMgr::Resume()) {
-        return Fail("resume", kDaemonHint);
+        return Report(context, LibraryFailure("resume", kDaemonHint));
     }
     return ShowPauseState(context, "resume");
 }
@@ -213,7 +184,7 @@ void AddStatusCommands(CLI::App &app, Context &context)
     CLI::App *statusCommand = AddCommand(
         app, context, "status", "indexing progress, overall and per folder: finished, processing, paused, err_no_space",
         [&context, status]() { return Status(context, *status); });
-    statusCommand->add_option("PATH", status->paths, "folders to show (default: every indexed folder)");
+    AddPaths(*statusCommand, context, status->paths, "folders to show (default: every indexed folder)");
     statusCommand->add_flag("--watch", status->watch,
                             "redraw until indexing has finished or Ctrl-C; with --json, print the finished state");
     statusCommand->add_option("--interval", status->interval, "seconds between redraws")

@@ -1,0 +1,106 @@
+#include "busy.h"
+
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <fstream>
+#include <random>
+#include <sstream>
+#include <thread>
+
+#include "appliance_paths.h"
+#include "fileindex/error.h"
+#include "path_encoding.h"
+
+namespace fileindex_tool {
+
+using VEXO::FILEINDEX::ErrorHandler;
+
+const LockFile kFolderListLock = {"the folder list lock", FILEINDEX_FOLDER_LOCK_PATH};
+const LockFile kStatusLock = {"the status lock", FILEINDEX_STATUS_LOCK_PATH};
+
+namespace {
+
+// The pid of the first /proc/locks line holding (not waiting for) a lock on the file with this
+// device and inode, or -1. A line reads "1: FLOCK  ADVISORY  WRITE 1234 08:01:5678 0 EOF"; a waiter's
+// line has "->" after the number.
+long FindLockPid(dev_t device, ino_t inode)
+{
+    std::ifstream locks("/proc/locks");
+    std::string line;
+    while (std::getline(locks, line)) {
+        std::istringstream fields(line);
+        std::string number, kind, mode, access, file;
+        long pid = -1;
+        if (!(fields >> number >> kind) || kind == "->" || !(fields >> mode >> access >> pid >> file)) {
+            continue;
+        }
+        unsigned int major = 0, minor = 0;
+        unsigned long long fileInode = 0;
+        if (sscanf(file.c_str(), "%x:%x:%llu", &major, &minor, &fileInode) == 3 && major == major(device) &&
+            minor == minor(device) && fileInode == inode && pid > 0) {
+            return pid;
+        }
+    }
+    return -1;
+}
+
+}  // namespace
+
+std::string LockHolder(const std::string &lockPath)
+{
+    struct stat status;
+    if (stat(lockPath.c_str(), &status) != 0) {
+        return "";
+    }
+    const long pid = FindLockPid(status.st_dev, status.st_ino);
+    if (pid < 0) {
+        return "";
+    }
+    std::ifstream commFile("/proc/" + std::to_string(pid) + "/comm");
+    std::string command;
+    std::getline(commFile, command);
+    const std::string holder = "pid " + std::to_string(pid);
+    return command.empty() ? holder : holder + " (" + TerminalText(command) + ")";
+}
+
+bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call)
+{
+    using Clock = std::chrono::steady_clock;
+    const Clock::time_point deadline =
+        Clock::now() + std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(waitSeconds));
+    std::minstd_rand random(static_cast<unsigned>(getpid()) ^
+                            static_cast<unsigned>(Clock::now().time_since_epoch().count()));
+    std::chrono::milliseconds backOff(10);
+    for (;;) {
+        ClearLastError();
+        const bool done = call();
+        if (done || ErrorHandler::GetError() != VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
+            return done;
+        }
+        const Clock::time_point now = Clock::now();
+        if (now >= deadline) {
+            return false;
+        }
+        std::uniform_int_distribution<long> jitter(backOff.count() / 2, backOff.count());
+        const Clock::duration sleep =
+            std::min<Clock::duration>(std::chrono::milliseconds(jitter(random)), deadline - now);
+        std::this_thread::sleep_for(sleep);
+        backOff = std::min(backOff * 2, std::chrono::milliseconds(250));
+    }
+}
+
+Failure BusyFailure(const std::string &what, const LockFile &lock, double waitSeconds)
+{
+    const std::string holder = LockHolder(lock.path);
+    std::ostringstream message;
+    message << what << ": " << lock.what << " (" << TerminalText(lock.path) << ") is held by "
+            << (holder.empty() ? "another process" : holder) << "; still busy after " << waitSeconds
+            << " s; retry once that process is done, or wait longer";
+    return ToolFailure(FailureKind::kBusy, VEXO::FILEINDEX::FILEIDX_ERR_LOCK, message.str());
+}
+
+}  // namespace fileindex_tool

@@ -1,0 +1,94 @@
+#include "records.h"
+
+#include <set>
+
+#include "fileindex/status.h"
+#include "fileindex/utils.h"
+#include "path_encoding.h"
+
+namespace fileindex_tool {
+
+using VEXO::FILEINDEX::Folder;
+using VEXO::FILEINDEX::StatusMgr;
+
+namespace {
+
+// status.conf as the library loads it, with the names of the shares its marks hold.
+class StatusMarks : public VEXO::FILEINDEX::Status {
+public:
+    void AddMarkedShares(std::set<std::string> &shares) const
+    {
+        for (const char *mark : {"no_space", "need_reindex"}) {
+            const Json::Value &marked = m_jsConfig[mark];
+            if (marked.isObject()) {
+                for (const std::string &share : marked.getMemberNames()) {
+                    shares.insert(share);
+                }
+            }
+        }
+    }
+};
+
+}  // namespace
+
+Json::Value FolderRecord(const Json::Value &libraryRecord)
+{
+    Json::Value record(Json::objectValue);
+    SetBytesMember(record, "path", libraryRecord["path"].asString());
+    SetBytesMember(record, "name", libraryRecord["name"].asString());
+    for (const char *kind : {"document", "audio", "video", "photo"}) {
+        record[kind] = libraryRecord[kind].isBool() && libraryRecord[kind].asBool();
+    }
+    if (libraryRecord.isMember("additional")) {
+        record["additional"] = libraryRecord["additional"];
+    }
+    return record;
+}
+
+Json::Value FolderRecords(const std::vector<Folder> &folders)
+{
+    Json::Value records(Json::arrayValue);
+    for (const Folder &folder : folders) {
+        records.append(FolderRecord(folder.asJson()));
+    }
+    return records;
+}
+
+Json::Value FolderPage(const Json::Value &libraryPage)
+{
+    Json::Value page;
+    page["total"] = libraryPage["total"];
+    page["offset"] = libraryPage["offset"];
+    page["folders"] = Json::Value(Json::arrayValue);
+    for (const Json::Value &record : libraryPage["folder"]) {
+        page["folders"].append(FolderRecord(record));
+    }
+    return page;
+}
+
+Json::Value ShareMarks(const std::string &share)
+{
+    Json::Value marks;
+    SetBytesMember(marks, "share_name", share);
+    marks["no_space"] = StatusMgr::ShareIsNoSpace(share);
+    marks["need_reindex"] = StatusMgr::ShareIsNeedReindex(share);
+    return marks;
+}
+
+std::vector<std::string> KnownShares(const std::vector<Folder> &folders)
+{
+    std::set<std::string> shares;
+    for (const Folder &folder : folders) {
+        std::string share;
+        if (VEXO::FILEINDEX::GetShareNameByPath(share, folder.m_path)) {
+            shares.insert(share);
+        }
+    }
+    StatusMarks status;
+    if (status.Load()) {
+        status.AddMarkedShares(shares);
+    }
+    return std::vector<std::string>(shares.begin(), shares.end());
+}
+
+}  // namespace fileindex_tool
