@@ -1,3 +1,4 @@
+// The benchmarks' sandbox appliance, generated data, peak-memory measure and command line.
 #include "bench/sandbox.h"
 
 #include <malloc.h>

@@ -1,3 +1,4 @@
+// Config: the lock on the lock file, and loading and saving the document through json_io.
 #include "fileindex/config.h"
 
 #include <fcntl.h>

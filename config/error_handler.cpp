@@ -1,3 +1,4 @@
+// The process-wide last error code and the LOG_LEVEL switch.
 #include <syslog.h>
 
 #include "fileindex/error.h"

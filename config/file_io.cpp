@@ -1,3 +1,4 @@
+// The file helpers of file_io.h: reads, opening in shared directories, line files, atomic saves.
 #include "config/file_io.h"
 
 #include <dirent.h>

@@ -1,3 +1,4 @@
+// IsJsonText: the grammar check of json_grammar.h with an observer that records nothing.
 #include "config/json_grammar.h"
 
 namespace VEXO {

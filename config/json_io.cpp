@@ -1,3 +1,4 @@
+// fromString, toString, fromFile and toFile: the library's four whole-document JSON operations.
 #include "config/json_io.h"
 
 #include <memory>

@@ -1,3 +1,4 @@
+// String and number tokens of a grammar scan decoded as the JSON library decodes them.
 #include "config/json_token.h"
 
 namespace VEXO {

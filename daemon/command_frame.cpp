@@ -1,3 +1,4 @@
+// The bytes of one command frame to fileindexd.
 #include "daemon/command_frame.h"
 
 #include <cstring>

@@ -1,3 +1,4 @@
+// AddCustomEvent, appending to a share's event queue file, and the search for a pending reindex.
 #include <fcntl.h>
 #include <sys/file.h>
 #include <unistd.h>

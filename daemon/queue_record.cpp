@@ -1,3 +1,4 @@
+// One queue line judged straight from its text, and the same judgement through the JSON library.
 #include "daemon/queue_record.h"
 
 #include <cstring>

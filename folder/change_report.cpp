@@ -1,3 +1,4 @@
+// The folder setting that governs a full path, and the per-medium difference of two settings.
 #include "folder/change_report.h"
 
 #include "fileindex/utils.h"

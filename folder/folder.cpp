@@ -1,3 +1,4 @@
+// Folder: one folder setting, its record in folder.conf and its computed information.
 #include "fileindex/folder.h"
 
 #include "config/json_io.h"

@@ -1,3 +1,4 @@
+// folder.conf read straight from its text into folder records, all or one share's.
 #include "folder/folder_list_text.h"
 
 #include <algorithm>

@@ -1,3 +1,4 @@
+// Folders: the folder list file, its merge with change reports, lookup and the paged listing.
 #include "fileindex/folder.h"
 
 #include <algorithm>

@@ -1,3 +1,4 @@
+// IndexMgr::List (all folders, or a sorted page) and IndexMgr::Get, the locked lookup of a folder.
 #include "fileindex/index_mgr.h"
 
 #include "config/unlock_on_return.h"

@@ -1,3 +1,4 @@
+// The fuzz targets' sandbox appliance, made before the first input, and their quiet syslog.
 #include "fuzz/fuzz_sandbox.h"
 
 #include <fcntl.h>

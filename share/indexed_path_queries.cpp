@@ -1,3 +1,4 @@
+// Whether a path, full path or share is indexed: IndexMgr's queries and their flat functions.
 #include "fileindex/index_mgr.h"
 
 #include "config/log.h"

@@ -1,3 +1,4 @@
+// The search of a share's queue files for events on a folder or inside it, one reading per call.
 #include "status/folder_events.h"
 
 #include <algorithm>

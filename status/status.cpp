@@ -1,3 +1,4 @@
+// Status: the status file's pause state, share marks and updated marks.
 #include "fileindex/status.h"
 
 #include <cstring>

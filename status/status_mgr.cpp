@@ -1,3 +1,4 @@
+// StatusMgr: status changes told to the daemon under the lock, and the indexing progress report.
 #include <cstdint>
 #include <ctime>
 #include <functional>

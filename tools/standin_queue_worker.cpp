@@ -1,3 +1,4 @@
+// The stand-in daemon's worker that takes each share's event queue and works through its records.
 #include "standin_queue_worker.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// The emulation's fault rules of faults.json, read and matched against each call.
 #include "faults.h"
 
 #include <map>

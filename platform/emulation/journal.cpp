@@ -1,3 +1,4 @@
+// Appends one line per side-effecting call to the emulation's journal.jsonl.
 #include "journal.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// JSON values made from the platform interface's C texts.
 #include "json_text.h"
 
 #include <cstring>

@@ -1,3 +1,4 @@
+// Host processes started, waited for and stopped for exec and the emulated services.
 #include "process.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// The emulated share database read from shares.json, and its path rules.
 #include "shares.h"
 
 #include <cstring>

@@ -1,3 +1,4 @@
+// The emulation's state directory: file paths, read-modify-write of its files, the parse cache.
 #include "state_dir.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// Forked child processes for tests: ready signal, kill and reap.
 #include "tests/support/child.h"
 
 #include <fcntl.h>

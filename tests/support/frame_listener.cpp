@@ -1,3 +1,4 @@
+// A listener on the daemon socket that records each connection's bytes.
 #include "tests/support/frame_listener.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// The test executable's own syslog, which keeps each formatted line for the tests to read.
 #include "tests/support/log_capture.h"
 
 #include <stdarg.h>

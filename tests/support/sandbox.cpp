@@ -1,3 +1,4 @@
+// The tests' sandbox appliance under the build's root, made afresh for every test.
 #include "tests/support/sandbox.h"
 
 #include <fcntl.h>

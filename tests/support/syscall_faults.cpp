@@ -1,3 +1,4 @@
+// The test executable's interposed system calls: armed faults and recorded socket writes.
 #include "tests/support/syscall_faults.h"
 
 #include <dirent.h>
