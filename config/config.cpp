@@ -1,4 +1,4 @@
-// Config: the lock on the lock file, and loading and saving the document through json_io.
+// Config: the lock on the lock file, and the document loaded and saved through json_io.
 #include "fileindex/config.h"
 
 #include <fcntl.h>
@@ -11,6 +11,7 @@
 
 #include "config/json_io.h"
 #include "config/log.h"
+#include "config/owned_fd.h"
 #include "fileindex/error.h"
 #include "fileindex/utils.h"
 
@@ -30,25 +31,25 @@ Config::~Config() = default;
 bool Config::Lock(bool exclusive)
 {
     const int operation = (exclusive ? LOCK_EX : LOCK_SH) | LOCK_NB;
-    for (int attempts = kLockAttempts;;) {
+    for (int attempt = 1;; ++attempt) {
         // The lock file sits in a directory every account may write: a symbolic link planted in its
         // place is refused, never followed.
-        m_fdLock = open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
-        if (m_fdLock < 0) {
-            break;
-        }
-        if (flock(m_fdLock, operation) == 0) {
+        OwnedFd fd(open(GetLockPath().c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644));
+        if (fd.IsOpen() && flock(fd.Get(), operation) == 0) {
+            m_fdLock = fd.Release();
             return true;
         }
-        if (errno != EINTR && errno != EAGAIN) {
+        const bool contended = fd.IsOpen() && (errno == EINTR || errno == EAGAIN);
+        if (contended) {
+            usleep(static_cast<useconds_t>((rand() % 10) * 1000));
+        }
+        if (!contended || attempt == kLockAttempts) {
+            // What the last attempt opened (-1 when the open failed) stays in m_fdLock until Unlock,
+            // which every caller calls.
+            m_fdLock = fd.Release();
             break;
         }
-        usleep(static_cast<useconds_t>((rand() % 10) * 1000));
-        if (--attempts == 0) {
-            break;  // the last attempt's descriptor stays in m_fdLock until Unlock
-        }
-        close(m_fdLock);  // a retry opens the file afresh and returns what the failed attempt opened
-        m_fdLock = -1;
+        // A retry opens the file afresh; this attempt's descriptor is closed here.
     }
     FILEIDX_LOG("%s:%d Failed to lock folder");
     ErrorHandler::SetError(FILEIDX_ERR_LOCK);

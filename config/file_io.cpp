@@ -38,7 +38,7 @@ void SplitPath(const std::string &path, std::string &dir, std::string &name)
 }
 
 // Writes until all of size is written or a write fails (one writing nothing fails too, as a full
-// disk may answer); returns the bytes written.
+// disk may answer, and then sets errno to ENOSPC); returns the bytes written.
 size_t WriteAll(int fd, const char *data, size_t size)
 {
     size_t done = 0;
@@ -48,6 +48,7 @@ size_t WriteAll(int fd, const char *data, size_t size)
             continue;
         }
         if (written <= 0) {
+            errno = written == 0 ? ENOSPC : errno;
             break;
         }
         done += static_cast<size_t>(written);
@@ -55,20 +56,13 @@ size_t WriteAll(int fd, const char *data, size_t size)
     return done;
 }
 
-void CloseKeepingErrno(int fd)
-{
-    const int reason = errno;
-    close(fd);
-    errno = reason;
-}
-
 // The directory holding path, opened without following a symbolic link at its last component;
 // name receives path's last component.
-int OpenParentDirectory(const std::string &path, std::string &name)
+OwnedFd OpenParentDirectory(const std::string &path, std::string &name)
 {
     std::string dir;
     SplitPath(path, dir, name);
-    return open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+    return OwnedFd(open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
 }
 
 bool IsOrphan(int dirFd, const char *entryName, long pid)
@@ -83,12 +77,15 @@ bool IsOrphan(int dirFd, const char *entryName, long pid)
 // Removes temporary files of name left by savers that were killed mid-save.
 void SweepOrphanedTempFiles(const std::string &dir, const std::string &name)
 {
-    DIR *d = opendir(dir.c_str());
+    struct CloseDir {
+        void operator()(DIR *d) const { closedir(d); }
+    };
+    const std::unique_ptr<DIR, CloseDir> d(opendir(dir.c_str()));
     if (d == nullptr) {
         return;
     }
     const std::string prefix = name + kTempInfix;
-    while (const dirent *entry = readdir(d)) {
+    while (const dirent *entry = readdir(d.get())) {
         const char *entryName = entry->d_name;
         if (strncmp(entryName, prefix.c_str(), prefix.size()) != 0) {
             continue;
@@ -98,19 +95,17 @@ void SweepOrphanedTempFiles(const std::string &dir, const std::string &name)
         if (pid <= 0 || *pidEnd != '.') {
             continue;
         }
-        if (IsOrphan(dirfd(d), entryName, pid)) {
-            unlinkat(dirfd(d), entryName, 0);
+        if (IsOrphan(dirfd(d.get()), entryName, pid)) {
+            unlinkat(dirfd(d.get()), entryName, 0);
         }
     }
-    closedir(d);
 }
 
 void SyncDirectory(const std::string &dir)
 {
-    const int fd = open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    if (fd >= 0) {
-        fsync(fd);
-        close(fd);
+    const OwnedFd fd(open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (fd.IsOpen()) {
+        fsync(fd.Get());
     }
 }
 
@@ -118,69 +113,64 @@ void SyncDirectory(const std::string &dir)
 
 bool ReadWholeFile(const std::string &path, std::string &content)
 {
-    const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd < 0) {
+    const OwnedFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    if (!fd.IsOpen()) {
         return false;
     }
     content.clear();
     char buffer[16384];
     for (;;) {
-        const ssize_t got = read(fd, buffer, sizeof(buffer));
+        const ssize_t got = read(fd.Get(), buffer, sizeof(buffer));
         if (got < 0 && errno == EINTR) {
             continue;
         }
         if (got <= 0) {
-            close(fd);
             return got == 0;
         }
         content.append(buffer, static_cast<size_t>(got));
     }
 }
 
-int OpenRegularFile(const std::string &path, int flags, mode_t mode)
+bool OpenRegularFile(const std::string &path, int flags, mode_t mode, OwnedFd &fd)
 {
     std::string name;
-    const int dirFd = OpenParentDirectory(path, name);
-    if (dirFd < 0) {
-        return -1;
+    const OwnedFd dir = OpenParentDirectory(path, name);
+    if (!dir.IsOpen()) {
+        return false;
     }
     // Non-blocking, so that a FIFO in the file's place cannot hold the open up.
-    const int fd = openat(dirFd, name.c_str(), flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, mode);
-    CloseKeepingErrno(dirFd);
-    if (fd < 0) {
-        return -1;
-    }
+    OwnedFd file(openat(dir.Get(), name.c_str(), flags | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, mode));
     struct stat st;
-    if (fstat(fd, &st) != 0) {
-        CloseKeepingErrno(fd);
-        return -1;
+    if (!file.IsOpen() || fstat(file.Get(), &st) != 0) {
+        return false;
     }
     if (!S_ISREG(st.st_mode)) {
-        close(fd);
         errno = EINVAL;
-        return -1;
+        return false;
     }
-    return fd;
+    fd = std::move(file);
+    return true;
 }
 
-int MakeDirectory(const std::string &path, mode_t mode)
+bool MakeDirectory(const std::string &path, mode_t mode)
 {
     std::string name;
-    const int dirFd = OpenParentDirectory(path, name);
-    if (dirFd < 0) {
-        return -1;
+    const OwnedFd dir = OpenParentDirectory(path, name);
+    if (!dir.IsOpen()) {
+        return false;
     }
-    int result = mkdirat(dirFd, name.c_str(), mode);
+    if (mkdirat(dir.Get(), name.c_str(), mode) == 0) {
+        return true;
+    }
     struct stat st;
-    if (result != 0 && errno == EEXIST && fstatat(dirFd, name.c_str(), &st, AT_SYMLINK_NOFOLLOW) == 0) {
-        if (S_ISDIR(st.st_mode)) {
-            result = 0;
-        } else {
-            errno = S_ISLNK(st.st_mode) ? ELOOP : ENOTDIR;
-        }
+    if (errno != EEXIST || fstatat(dir.Get(), name.c_str(), &st, AT_SYMLINK_NOFOLLOW) != 0) {
+        return false;
     }
-    CloseKeepingErrno(dirFd);
-    return result;
+    if (S_ISDIR(st.st_mode)) {
+        return true;
+    }
+    errno = S_ISLNK(st.st_mode) ? ELOOP : ENOTDIR;
+    return false;
 }
 
 bool AppendLine(int fd, const std::string &line, size_t &written)
@@ -207,8 +197,8 @@ bool AppendLine(int fd, const std::string &line, size_t &written)
 
 bool ForEachLine(const std::string &path, const std::function<bool(std::string_view line)> &visit)
 {
-    const int fd = OpenRegularFile(path, O_RDONLY);
-    if (fd < 0) {
+    OwnedFd fd;
+    if (!OpenRegularFile(path, O_RDONLY, 0, fd)) {
         return false;
     }
     size_t capacity = kLineBlockSize;
@@ -221,12 +211,11 @@ bool ForEachLine(const std::string &path, const std::function<bool(std::string_v
             block = std::move(larger);
             capacity *= 2;
         }
-        const ssize_t got = read(fd, block.get() + kept, capacity - kept);
+        const ssize_t got = read(fd.Get(), block.get() + kept, capacity - kept);
         if (got < 0 && errno == EINTR) {
             continue;
         }
         if (got < 0) {
-            close(fd);
             return false;
         }
         if (got == 0) {
@@ -237,7 +226,6 @@ bool ForEachLine(const std::string &path, const std::function<bool(std::string_v
         const char *search = line + kept;  // the kept start holds no newline
         while (const char *newline = static_cast<const char *>(memchr(search, '\n', end - search))) {
             if (!visit(std::string_view(line, static_cast<size_t>(newline - line)))) {
-                close(fd);
                 return true;
             }
             line = search = newline + 1;
@@ -245,7 +233,7 @@ bool ForEachLine(const std::string &path, const std::function<bool(std::string_v
         kept = static_cast<size_t>(end - line);
         memmove(block.get(), line, kept);
     }
-    close(fd);
+    fd.Close();
     if (kept > 0) {
         visit(std::string_view(block.get(), kept));
     }
@@ -260,15 +248,17 @@ bool ReplaceFileAtomically(const std::string &path, const std::string &content)
     SweepOrphanedTempFiles(dir, name);
 
     std::string tempPath = path + kTempInfix + std::to_string(getpid()) + ".XXXXXX";
-    const int fd = mkostemp(&tempPath[0], O_CLOEXEC);
-    if (fd < 0) {
+    OwnedFd fd(mkostemp(&tempPath[0], O_CLOEXEC));
+    if (!fd.IsOpen()) {
         return false;
     }
-    const bool written =
-        fchmod(fd, 0644) == 0 && WriteAll(fd, content.data(), content.size()) == content.size() && fsync(fd) == 0;
-    const bool closed = close(fd) == 0;
-    if (!written || !closed || rename(tempPath.c_str(), path.c_str()) != 0) {
+    const bool written = fchmod(fd.Get(), 0644) == 0 &&
+                         WriteAll(fd.Get(), content.data(), content.size()) == content.size() && fsync(fd.Get()) == 0;
+    // Closed before the rename, and its result counts: a file system may report a lost write only here.
+    if (!written || !fd.Close() || rename(tempPath.c_str(), path.c_str()) != 0) {
+        const int reason = errno;
         unlink(tempPath.c_str());
+        errno = reason;
         return false;
     }
     SyncDirectory(dir);

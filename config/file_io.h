@@ -1,4 +1,12 @@
-// Whole-file reads, line files and atomic replacement. Every descriptor opened here is close-on-exec.
+// File helpers of the library and of the emulated platform: whole-file reads, files opened in
+// directories other users may write, line files, and atomic replacement.
+//
+// One convention for every helper here that can fail: it returns bool, true when it did its whole
+// job, false with errno telling why (the errno of the step that failed; releasing what the helper
+// had opened never changes it). Inputs come first, then what the helper produces, as out-parameters
+// that are meaningful on success only unless a comment says otherwise. A descriptor a helper opens
+// is handed out as an OwnedFd; one it is given is a plain int that the caller keeps owning. Every
+// descriptor opened here is close-on-exec.
 #ifndef FILEINDEX_CONFIG_FILE_IO_H
 #define FILEINDEX_CONFIG_FILE_IO_H
 
@@ -8,6 +16,8 @@
 #include <string>
 #include <string_view>
 
+#include "config/owned_fd.h"
+
 namespace VEXO {
 namespace FILEINDEX {
 
@@ -16,14 +26,14 @@ bool ReadWholeFile(const std::string &path, std::string &content);
 
 // Opens a file in a directory that other users may write (a share's "@eaDir"): a symbolic link in
 // place of the file or of its directory is refused (ELOOP), and so is anything but a regular file,
-// such as a FIFO that would block (EINVAL). flags are open's, O_NOFOLLOW and O_CLOEXEC added.
-// The descriptor, or -1 with errno set.
-int OpenRegularFile(const std::string &path, int flags, mode_t mode = 0);
+// such as a FIFO that would block (EINVAL). flags are open's, O_NOFOLLOW and O_CLOEXEC added; mode
+// is the creation mode for O_CREAT.
+bool OpenRegularFile(const std::string &path, int flags, mode_t mode, OwnedFd &fd);
 
 // Makes the directory path (mode before the umask) inside its parent, refusing a symbolic link in
 // place of either (ELOOP). An existing directory is fine; anything else already there fails with
-// ENOTDIR. 0, or -1 with errno set.
-int MakeDirectory(const std::string &path, mode_t mode);
+// ENOTDIR.
+bool MakeDirectory(const std::string &path, mode_t mode);
 
 // Calls visit with each newline-separated line of the file (without its newline; a last line
 // without one included) until visit returns false. The file is opened with OpenRegularFile.
@@ -36,7 +46,7 @@ bool ForEachLine(const std::string &path, const std::function<bool(std::string_v
 // locked by the caller) whole or not at all. When the file does not end in a newline (a writer was
 // cut short or killed), one is written first, so that the torn line stays alone. A short write is
 // continued; when the rest cannot be written the file is cut back to its length before the call.
-// written receives the bytes written before a failure (the newline included).
+// written receives the bytes written, on failure too (the newline included), for the caller's log.
 bool AppendLine(int fd, const std::string &line, size_t &written);
 
 // Writes content to a temporary file beside path (mode 0644), syncs it, renames it over path and

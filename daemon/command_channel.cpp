@@ -10,6 +10,7 @@
 #include <cstring>
 
 #include "appliance_paths.h"
+#include "config/owned_fd.h"
 #include "daemon/command_frame.h"
 #include "fileindex/utils.h"
 
@@ -46,25 +47,21 @@ bool WriteLoop(int fd, const char *buffer, size_t n)
 
 // The send time-out is set before connecting: it also bounds the wait of a connection that a
 // daemon, alive but no longer accepting, leaves in its full backlog.
-int ConnectToDaemon()
+// A socket that is not open when the connection cannot be made.
+OwnedFd ConnectToDaemon()
 {
-    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    if (fd < 0) {
-        return -1;
-    }
+    OwnedFd fd(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     const timeval sendTimeout = {1, 0};
-    if (setsockopt(fd, SOL_SOCKET, SO_SNDTIMEO, &sendTimeout, sizeof(sendTimeout)) != 0) {
-        close(fd);
-        return -1;
+    if (!fd.IsOpen() || setsockopt(fd.Get(), SOL_SOCKET, SO_SNDTIMEO, &sendTimeout, sizeof(sendTimeout)) != 0) {
+        return OwnedFd();
     }
     sockaddr_un address;
     memset(&address, 0, sizeof(address));
     address.sun_family = AF_UNIX;
     static_assert(sizeof(FILEINDEX_DAEMON_SOCKET_PATH) <= sizeof(address.sun_path), "socket path too long");
     memcpy(address.sun_path, FILEINDEX_DAEMON_SOCKET_PATH, sizeof(FILEINDEX_DAEMON_SOCKET_PATH));
-    if (connect(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)) != 0) {
-        close(fd);
-        return -1;
+    if (connect(fd.Get(), reinterpret_cast<const sockaddr *>(&address), sizeof(address)) != 0) {
+        return OwnedFd();
     }
     return fd;
 }
@@ -75,16 +72,14 @@ bool SendCammandToDaemon(const std::string &type, const Json::Value &data)
 {
     // A daemon that has gone away must give a failed write, not kill the caller.
     signal(SIGPIPE, SIG_IGN);
-    const int fd = ConnectToDaemon();
-    if (fd < 0) {
+    const OwnedFd fd = ConnectToDaemon();
+    if (!fd.IsOpen()) {
         return false;
     }
     // The length and the rest of the frame go out as two separate writes.
     const std::string frame = EncodeCommandFrame(type, data);
-    const bool sent = WriteLoop(fd, frame.data(), kFrameLengthSize) &&
-                      WriteLoop(fd, frame.data() + kFrameLengthSize, frame.size() - kFrameLengthSize);
-    close(fd);
-    return sent;
+    return WriteLoop(fd.Get(), frame.data(), kFrameLengthSize) &&
+           WriteLoop(fd.Get(), frame.data() + kFrameLengthSize, frame.size() - kFrameLengthSize);
 }
 
 }  // namespace FILEINDEX

@@ -36,14 +36,12 @@ enum class Append { kWritten, kContended, kFailed };
 Append AppendRecord(const std::string &queue, const std::string &line)
 {
     for (int attempt = 1;; ++attempt) {
-        const int fd = OpenRegularFile(queue, O_RDWR | O_CREAT | O_APPEND, kQueueFileMode);
-        if (fd < 0) {
+        OwnedFd fd;
+        if (!OpenRegularFile(queue, O_RDWR | O_CREAT | O_APPEND, kQueueFileMode, fd)) {
             return Append::kFailed;
         }
-        if (flock(fd, LOCK_EX | LOCK_NB) != 0) {
-            const int reason = errno;
-            close(fd);
-            errno = reason;  // what the debug lines' %m names
+        if (flock(fd.Get(), LOCK_EX | LOCK_NB) != 0) {
+            const int reason = errno;  // what the debug lines' %m names; the descriptor closes after them
             if (reason != EINTR && reason != EAGAIN) {
                 FILEIDX_DEBUG("%s:%d flock fail, path=%s, reason=%m", queue.c_str());
                 return Append::kFailed;
@@ -56,12 +54,11 @@ Append AppendRecord(const std::string &queue, const std::string &line)
             continue;
         }
         size_t written = 0;
-        const bool appended = AppendLine(fd, line, written);
+        const bool appended = AppendLine(fd.Get(), line, written);
         if (!appended) {
             FILEIDX_DEBUG("%s:%d write fail, (%ld, %ld)", static_cast<long>(written), static_cast<long>(line.size()));
         }
-        flock(fd, LOCK_UN);
-        close(fd);
+        flock(fd.Get(), LOCK_UN);
         return appended ? Append::kWritten : Append::kFailed;
     }
 }

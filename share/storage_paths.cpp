@@ -51,7 +51,7 @@ int StoragePathGet(const char *szName, char *szOut, int cbOutLen, const char *ou
     snprintf(szOut, static_cast<size_t>(cbOutLen), "%s", path.c_str());
     // The full path is made whatever the caller's buffer holds; a symbolic link at "@eaDir" or at
     // the directory itself, planted by a share user, is refused rather than followed.
-    if (makeFinalDir && MakeDirectory(path, 0777) != 0) {
+    if (makeFinalDir && !MakeDirectory(path, 0777)) {
         FILEIDX_LOG("%s:%d mkdir failed, path=%s, reason=%m", path.c_str());
     }
     VEXOShareFree(share);
