@@ -8,17 +8,21 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cerrno>
 #include <cstring>
 #include <ctime>
+#include <limits>
 #include <memory>
 
 namespace VEXO {
 namespace FILEINDEX {
 namespace {
 
-// Temporary files are named "<name>.tmp.<pid>.<random>" so that a sweep can tell whose they are.
 const char kTempInfix[] = ".tmp.";
+// What mkostemp replaces with six random letters and digits.
+const char kTempRandom[] = "XXXXXX";
+constexpr size_t kTempRandomSize = sizeof(kTempRandom) - 1;
 // No save takes this long: a temporary file this old is an orphan whatever its process number says.
 constexpr time_t kOrphanAge = 3600;
 
@@ -65,9 +69,9 @@ OwnedFd OpenParentDirectory(const std::string &path, std::string &name)
     return OwnedFd(open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
 }
 
-bool IsOrphan(int dirFd, const char *entryName, long pid)
+bool IsOrphan(int dirFd, const char *entryName, pid_t pid)
 {
-    if (kill(static_cast<pid_t>(pid), 0) == -1 && errno == ESRCH) {
+    if (kill(pid, 0) == -1 && errno == ESRCH) {
         return true;
     }
     struct stat st;
@@ -84,18 +88,10 @@ void SweepOrphanedTempFiles(const std::string &dir, const std::string &name)
     if (d == nullptr) {
         return;
     }
-    const std::string prefix = name + kTempInfix;
     while (const dirent *entry = readdir(d.get())) {
         const char *entryName = entry->d_name;
-        if (strncmp(entryName, prefix.c_str(), prefix.size()) != 0) {
-            continue;
-        }
-        char *pidEnd = nullptr;
-        const long pid = strtol(entryName + prefix.size(), &pidEnd, 10);
-        if (pid <= 0 || *pidEnd != '.') {
-            continue;
-        }
-        if (IsOrphan(dirfd(d.get()), entryName, pid)) {
+        pid_t pid = 0;
+        if (ParseTempFileName(entryName, name, pid) && IsOrphan(dirfd(d.get()), entryName, pid)) {
             unlinkat(dirfd(d.get()), entryName, 0);
         }
     }
@@ -110,6 +106,39 @@ void SyncDirectory(const std::string &dir)
 }
 
 }  // namespace
+
+std::string TempFileTemplate(const std::string &path, pid_t pid)
+{
+    return path + kTempInfix + std::to_string(pid) + "." + kTempRandom;
+}
+
+bool ParseTempFileName(std::string_view entry, const std::string &name, pid_t &pid)
+{
+    const size_t prefixSize = name.size() + sizeof(kTempInfix) - 1;
+    if (entry.size() <= prefixSize + 1 + kTempRandomSize || entry.compare(0, name.size(), name) != 0 ||
+        entry.compare(name.size(), prefixSize - name.size(), kTempInfix) != 0) {
+        return false;
+    }
+    // The process number: decimal digits without a sign or a leading zero, within pid_t.
+    const std::string_view digits = entry.substr(prefixSize, entry.size() - prefixSize - 1 - kTempRandomSize);
+    long long number = 0;
+    for (const char c : digits) {
+        if (c < '0' || c > '9' || (number == 0 && c == '0') || number > std::numeric_limits<pid_t>::max() / 10) {
+            return false;
+        }
+        number = number * 10 + (c - '0');
+    }
+    if (number > std::numeric_limits<pid_t>::max() || entry[entry.size() - 1 - kTempRandomSize] != '.') {
+        return false;
+    }
+    for (const char c : entry.substr(entry.size() - kTempRandomSize)) {
+        if (!isalnum(static_cast<unsigned char>(c))) {
+            return false;
+        }
+    }
+    pid = static_cast<pid_t>(number);
+    return true;
+}
 
 bool ReadWholeFile(const std::string &path, std::string &content)
 {
@@ -247,7 +276,7 @@ bool ReplaceFileAtomically(const std::string &path, const std::string &content)
     SplitPath(path, dir, name);
     SweepOrphanedTempFiles(dir, name);
 
-    std::string tempPath = path + kTempInfix + std::to_string(getpid()) + ".XXXXXX";
+    std::string tempPath = TempFileTemplate(path, getpid());
     OwnedFd fd(mkostemp(&tempPath[0], O_CLOEXEC));
     if (!fd.IsOpen()) {
         return false;

@@ -56,6 +56,18 @@ bool AppendLine(int fd, const std::string &line, size_t &written);
 // older than an hour (their process number may since belong to another program).
 bool ReplaceFileAtomically(const std::string &path, const std::string &content);
 
+// The temporary files of ReplaceFileAtomically are named "<name>.tmp.<pid>.<random>": the saver's
+// process number, so that a sweep tells an orphan from a save in progress, and the six letters or
+// digits that mkostemp puts in place of "XXXXXX". These two functions are the only ones that build
+// or read that name.
+
+// The template mkostemp fills in for a save of path by process pid: path + ".tmp.<pid>.XXXXXX".
+std::string TempFileTemplate(const std::string &path, pid_t pid);
+// True when entry, a name in path's directory, is a temporary file name of the file called name;
+// pid receives the saver's process number. False for every other name, such as the file itself,
+// another file's temporaries, or a process number that is not a positive decimal pid_t.
+bool ParseTempFileName(std::string_view entry, const std::string &name, pid_t &pid);
+
 }  // namespace FILEINDEX
 }  // namespace VEXO
 

@@ -11,8 +11,10 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <limits>
 #include <set>
 
+#include "config/file_io.h"
 #include "config/json_io.h"
 #include "fileindex/config.h"
 #include "fileindex/error.h"
@@ -293,6 +295,30 @@ TEST_F(ConfigTest, SaverKilledMidSaveLeavesACompleteDocument)
     TestDoc doc;
     ASSERT_TRUE(doc.Save());
     EXPECT_TRUE(TempFilesBesideDoc().empty()) << "temporaries of killed savers are swept";
+}
+
+// A sweep that misread a temporary name would delete a live saver's file, or another document's, or
+// leave orphans to pile up; every name a save makes must read back as its own saver's.
+TEST(TempFileName, ReadsBackTheSaverOfEveryNameASaveMakesAndNoOtherName)
+{
+    for (const std::string name : {"folder.conf", "a", "x.tmp.7.abcdef", "sp ace\xff"}) {
+        for (const pid_t saver : {1, 4194304, std::numeric_limits<pid_t>::max()}) {
+            std::string made = TempFileTemplate(name, saver);
+            ASSERT_EQ(made.compare(made.size() - 6, 6, "XXXXXX"), 0) << made;
+            made.replace(made.size() - 6, 6, "aZ09xy");  // as mkostemp fills it in
+            pid_t read = 0;
+            EXPECT_TRUE(ParseTempFileName(made, name, read) && read == saver) << made;
+        }
+    }
+    for (const char *entry : {"folder.conf", "folder.conf.tmp", "folder.conf.tmp.12.", "folder.conf.tmp.12.abcde",
+                              "folder.conf.tmp.12.abcdefg", "folder.conf.tmp.12.abc-ef", "folder.conf.tmp.12x.abcdef",
+                              "folder.conf.tmp..abcdef", "folder.conf.tmp.-12.abcdef", "folder.conf.tmp.+12.abcdef",
+                              "folder.conf.tmp. 12.abcdef", "folder.conf.tmp.0.abcdef", "folder.conf.tmp.012.abcdef",
+                              "folder.conf.tmp.2147483648.abcdef", "folder.conf.tmp.99999999999999999999.abcdef",
+                              "status.conf.tmp.12.abcdef", "xfolder.conf.tmp.12.abcdef", "folder.conf.TMP.12.abcdef"}) {
+        pid_t read = 0;
+        EXPECT_FALSE(ParseTempFileName(entry, "folder.conf", read)) << entry;
+    }
 }
 
 TEST(JsonText, ReadsExactlyOneStrictJsonValue)

@@ -12,6 +12,7 @@
 #include <functional>
 #include <map>
 
+#include "config/file_io.h"
 #include "daemon/queue_record.h"
 #include "fileindex/error.h"
 #include "fileindex/fileidx.h"
@@ -247,7 +248,8 @@ TEST_F(HardeningTest, SaveSweepsTemporariesOfGoneOrLongStalledSavers)
     };
     std::vector<std::string> temporaries;
     for (const auto &c : cases) {
-        temporaries.push_back(kStatusConf + ".tmp." + std::to_string(c.pid) + ".a" + std::to_string(temporaries.size()));
+        std::string name = TempFileTemplate(kStatusConf, c.pid);
+        temporaries.push_back(name.replace(name.size() - 1, 1, std::to_string(temporaries.size())));
         WriteFile(temporaries.back(), "{}");
         const timeval times[2] = {{time(nullptr) - c.ageSeconds, 0}, {time(nullptr) - c.ageSeconds, 0}};
         utimes(temporaries.back().c_str(), times);
