@@ -1,6 +1,7 @@
 // fileindexctl as a user runs it: a process, its standard output, standard error and exit status.
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/file.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -12,6 +13,7 @@
 #include "config/json_io.h"
 #include "platform/service.h"
 #include "tests/support/child.h"
+#include "tests/support/frame_listener.h"
 #include "tests/support/sandbox.h"
 
 namespace fileindex_test {
@@ -73,31 +75,23 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
     WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
     struct Row {
         std::vector<std::string> args;
-        bool holdFolderLock;
         int status;
         std::string line;  // regular expression for the one line on standard error
     } rows[] = {
-        {{"folder", "get", "/photo/b"}, false, 4,
+        {{"folder", "get", "/photo/b"}, 4,
          "fileindexctl: folder get /photo/b: the folder is not in the folder list; .*folder list.* "
          "\\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
-        {{"folder", "get", "/photo/a"}, true, 75,
-         "fileindexctl: folder get /photo/a: another process holds the folder list or status lock; .* "
-         "\\(FILEIDX_ERR_LOCK\\)"},
-        {{"pause", "--hours", "-1"}, false, 1, "fileindexctl: pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
-        {{"resume"}, false, 1,
+        {{"pause", "--hours", "-1"}, 1, "fileindexctl: pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"resume"}, 1,
          "fileindexctl: resume: the change is saved, but fileindexd did not take the command: is the indexing "
          "service running\\? .*"},
-        {{"share", "space", "nosuch"}, false, 4, "fileindexctl: share space nosuch: .* \\(FILEIDX_ERR_PATH\\)"},
-        {{"share", "paths", "nosuch"}, false, 1, "fileindexctl: share paths nosuch: .*not in the share database.*"},
-        {{"folder", "set", "/photo/b", "--audio", "on"}, false, 4, "fileindexctl: folder set /photo/b: .*"},
-        {{"folder", "add", "/nosuch/a"}, false, 1, "fileindexctl: folder add: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
-        {{"reindex", "/music"}, false, 1, "fileindexctl: reindex: .*holds no indexed.*"},
+        {{"share", "space", "nosuch"}, 4, "fileindexctl: share space nosuch: .* \\(FILEIDX_ERR_PATH\\)"},
+        {{"share", "paths", "nosuch"}, 1, "fileindexctl: share paths nosuch: .*not in the share database.*"},
+        {{"folder", "set", "/photo/b", "--audio", "on"}, 4, "fileindexctl: folder set /photo/b: .*"},
+        {{"folder", "add", "/nosuch/a"}, 1, "fileindexctl: folder add: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"reindex", "/music"}, 1, "fileindexctl: reindex: .*holds no indexed.*"},
     };
     for (const Row &row : rows) {
-        std::unique_ptr<LockHolder> holder;
-        if (row.holdFolderLock) {
-            holder = std::make_unique<LockHolder>(FILEINDEX_FOLDER_LOCK_PATH, true);
-        }
         const Outcome outcome = Ctl(row.args);
         SCOPED_TRACE(row.line);
         EXPECT_EQ(outcome.status, row.status);
@@ -108,14 +102,65 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         std::vector<std::string> jsonArgs = row.args;
         jsonArgs.push_back("--json");
         const Json::Value error = ParseJson(Ctl(jsonArgs).out)["error"];
-        EXPECT_TRUE(std::regex_match(error["message"].asString() + (error["name"].isNull() ? "" : " (" + error["name"].asString() + ")"),
-                                     std::regex(row.line.substr(std::string("fileindexctl: ").size()))));
+        const std::string named = error["name"].isNull() ? "" : " (" + error["name"].asString() + ")";
+        EXPECT_TRUE(std::regex_match("fileindexctl: " + error["message"].asString() + named, std::regex(row.line)));
     }
     // A wrong command line is not the library's failure: status 2, and one line all the same.
     const Outcome usage = Ctl({"folder", "get"});
     EXPECT_EQ(usage.status, 2);
     EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
         << usage.err;
+}
+
+// A busy lock is not a failure. The commands whose lock comes before any effect try again until the
+// holder lets go; with --wait 0 they give up at once, exit 75 naming the holder, and leave folder.conf,
+// status.conf and the platform as they were.
+TEST_F(FileindexctlTest, ABusyLockIsWaitedForOrNamedAndLeavesNothingBehind)
+{
+    FrameListener daemon;
+    const struct Row {
+        std::vector<std::string> args;
+        const char *lock;
+    } rows[] = {
+        {{"folder", "get", "/photo/a"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"folder", "add", "/photo/b", "--photo"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"folder", "set", "/photo/a", "--audio", "on"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"folder", "remove", "/photo/a"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"share", "remove", "photo"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"share", "rename", "photo", "music"}, FILEINDEX_FOLDER_LOCK_PATH},
+        {{"share", "revive", "photo"}, FILEINDEX_STATUS_LOCK_PATH},
+        {{"pause", "--hours", "1"}, FILEINDEX_STATUS_LOCK_PATH},
+        {{"resume"}, FILEINDEX_STATUS_LOCK_PATH},
+    };
+    const std::string folderConf = R"({"/photo/a":{"path":"/photo/a","name":"A","photo":true}})";
+    const std::string statusConf = R"({"resume_time":-1,"no_space":{"photo":true}})";
+    for (const Row &row : rows) {
+        SCOPED_TRACE(row.args.front() + " " + row.args.back());
+        stdfs::create_directories(SharePath("photo") + "/a");
+        stdfs::create_directories(SharePath("photo") + "/b");
+        WriteFile(kFolderConf, folderConf);
+        WriteFile(FILEINDEX_STATUS_CONF_PATH, statusConf);
+        const size_t journal = Journal().size();
+        {
+            LockHolder holder(row.lock, true);
+            std::vector<std::string> args = row.args;
+            args.insert(args.end(), {"--wait", "0"});
+            const Outcome busy = Ctl(args);
+            EXPECT_EQ(busy.status, 75);
+            EXPECT_TRUE(std::regex_search(busy.err, std::regex(" is held by pid [0-9]+ \\(fileindex_tests\\); ")))
+                << busy.err;
+            EXPECT_EQ(ReadFile(kFolderConf), folderConf);
+            EXPECT_EQ(ReadFile(FILEINDEX_STATUS_CONF_PATH), statusConf);
+            EXPECT_EQ(Journal().size(), journal);
+        }
+        Child briefHolder([&row](const Child::Ready &ready) {
+            flock(open(row.lock, O_RDWR | O_CREAT | O_CLOEXEC, 0644), LOCK_EX);
+            ready();
+            usleep(300000);
+        });
+        const Outcome waited = Ctl(row.args);
+        EXPECT_EQ(waited.status, 0) << waited.err;
+    }
 }
 
 // Paths that are not UTF-8 or hold an escape sequence: the table shows them quoted so that no byte

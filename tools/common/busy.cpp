@@ -98,8 +98,11 @@ Failure BusyFailure(const std::string &what, const LockFile &lock, double waitSe
     const std::string holder = LockHolder(lock.path);
     std::ostringstream message;
     message << what << ": " << lock.what << " (" << TerminalText(lock.path) << ") is held by "
-            << (holder.empty() ? "another process" : holder) << "; still busy after " << waitSeconds
-            << " s; retry once that process is done, or wait longer";
+            << (holder.empty() ? "another process" : holder);
+    if (waitSeconds > 0) {
+        message << "; still busy after " << waitSeconds << " s";
+    }
+    message << "; retry once that process is done";
     return ToolFailure(FailureKind::kBusy, VEXO::FILEINDEX::FILEIDX_ERR_LOCK, message.str());
 }
 

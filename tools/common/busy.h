@@ -31,8 +31,9 @@ std::string LockHolder(const std::string &lockPath);
 // whose lock failure leaves nothing behind: the call is repeated whole. waitSeconds 0 is one attempt.
 bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call);
 
-// The failure of an operation whose lock stayed busy: "<what>: <lock> is held by <holder>; still
-// busy after <waitSeconds> s; retry when it is done, or wait longer", of kind kBusy, code 9.
+// The failure of an operation whose lock stayed busy: "<what>: <lock> (<path>) is held by <holder>;
+// still busy after <waitSeconds> s; retry once that process is done" (without the "still busy" part
+// for 0 s), of kind kBusy, code 9.
 Failure BusyFailure(const std::string &what, const LockFile &lock, double waitSeconds);
 
 }  // namespace fileindex_tool

@@ -10,6 +10,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "busy.h"
 #include "failure.h"
 
 namespace fileindexctl {
@@ -17,6 +18,7 @@ namespace fileindexctl {
 struct Context {
     bool json = false;               // --json: one JSON document instead of tables
     bool pathBytes = false;          // --path-bytes: path arguments are percent-encoded bytes
+    double wait = 5;                 // --wait: seconds to retry while a lock is busy
     std::function<int()> action;     // the chosen subcommand; returns the exit status
 };
 
@@ -24,6 +26,16 @@ struct Context {
 // action when the command line chooses it.
 CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name, const std::string &description,
                      std::function<int()> run);
+
+// Adds --wait SECONDS to a subcommand whose lock failure leaves nothing behind (see RunWaiting).
+void AddWaitOption(CLI::App &command, Context &context);
+// Runs call, and again while it fails because another process holds lock and --wait has not run
+// out. lock is the lock the operation takes before it does anything, so that a lock failure leaves
+// nothing behind; null for an operation that takes none of its own, or may have done part of its
+// work when it meets one: it runs once. On failure, failure is BusyFailure when the lock stayed busy,
+// otherwise LibraryFailure(what, withoutCode).
+bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
+                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure);
 
 // Adds the PATH arguments of a subcommand, and the --path-bytes flag that reads them as
 // percent-encoded bytes (path_encoding.h).

@@ -17,6 +17,7 @@ namespace fileindexctl {
 
 using fileindex_tool::ClearLastError;
 using fileindex_tool::Failure;
+using fileindex_tool::kFolderListLock;
 using fileindex_tool::LibraryFailure;
 using fileindex_tool::TerminalText;
 using VEXO::FILEINDEX::Folder;
@@ -95,9 +96,10 @@ int Add(const Context &context, SettingOptions &options)
     if (!TakePaths(context, "folder add", options.paths, failure)) {
         return Report(context, failure);
     }
-    ClearLastError();
-    if (!IndexMgr::Add(SettingRequest(options, true))) {
-        return Report(context, LibraryFailure("folder add", kFollowUpHint));
+    const Json::Value request = SettingRequest(options, true);
+    if (!RunWaiting(context, &kFolderListLock, "folder add", kFollowUpHint, [&request]() { return IndexMgr::Add(request); },
+                    failure)) {
+        return Report(context, failure);
     }
     return ShowStored(context, "folder add", "added", options.paths);
 }
@@ -110,14 +112,14 @@ int Set(const Context &context, SettingOptions &options)
     if (!TakePaths(context, "folder set", options.paths, failure)) {
         return Report(context, failure);
     }
-    ClearLastError();
     Json::Value record;
     const std::string what = "folder set " + TerminalText(options.paths.front());
-    if (!IndexMgr::Get(record, options.paths.front())) {
-        return Report(context, LibraryFailure(what, kReadHint));
-    }
-    if (!IndexMgr::Set(SettingRequest(options, false))) {
-        return Report(context, LibraryFailure(what, kFollowUpHint));
+    const Json::Value request = SettingRequest(options, false);
+    if (!RunWaiting(context, &kFolderListLock, what, kReadHint,
+                    [&record, &options]() { return IndexMgr::Get(record, options.paths.front()); }, failure) ||
+        !RunWaiting(context, &kFolderListLock, what, kFollowUpHint, [&request]() { return IndexMgr::Set(request); },
+                    failure)) {
+        return Report(context, failure);
     }
     return ShowStored(context, "folder set", "changed", options.paths);
 }
@@ -133,8 +135,10 @@ int Remove(const Context &context, std::vector<std::string> &paths)
     if (!ListFolders(before)) {
         return Report(context, LibraryFailure("folder remove", kReadHint));
     }
-    if (!IndexMgr::Delete(PathArray(paths))) {
-        return Report(context, LibraryFailure("folder remove", kFollowUpHint));
+    const Json::Value request = PathArray(paths);
+    if (!RunWaiting(context, &kFolderListLock, "folder remove", kFollowUpHint,
+                    [&request]() { return IndexMgr::Delete(request); }, failure)) {
+        return Report(context, failure);
     }
     const std::vector<Folder> removed = FoldersAt(before, paths);
     if (context.json) {
@@ -202,10 +206,10 @@ int Get(const Context &context, std::vector<std::string> &paths)
         return Report(context, failure);
     }
     const std::string &path = paths.front();
-    ClearLastError();
     Json::Value record;
-    if (!IndexMgr::Get(record, path)) {
-        return Report(context, LibraryFailure("folder get " + TerminalText(path), kReadHint));
+    if (!RunWaiting(context, &kFolderListLock, "folder get " + TerminalText(path), kReadHint,
+                    [&record, &path]() { return IndexMgr::Get(record, path); }, failure)) {
+        return Report(context, failure);
     }
     if (context.json) {
         PrintJson(fileindex_tool::FolderRecord(record));
@@ -226,6 +230,7 @@ void AddSettingCommand(CLI::App &folder, Context &context, bool adding)
                             [&context, options]() { return Add(context, *options); })
                : AddCommand(folder, context, "set", "change the name or media of an indexed folder",
                             [&context, options]() { return Set(context, *options); });
+    AddWaitOption(*command, context);
     if (adding) {
         AddPaths(*command, context, options->paths, "share-relative paths, /<share>/<folder>")->required();
         options->nameGiven = command->add_option("--name", options->name, "display name (default: the folder's name)");
@@ -268,6 +273,7 @@ void AddFolderCommands(CLI::App &app, Context &context)
     auto path = std::make_shared<std::vector<std::string>>();
     CLI::App *get = AddCommand(*folder, context, "get", "show one folder's setting (read under the folder lock)",
                                [&context, path]() { return Get(context, *path); });
+    AddWaitOption(*get, context);
     AddPaths(*get, context, *path, "share-relative path of an indexed folder, /<share>/<folder>")
         ->required()
         ->expected(1);
@@ -280,6 +286,7 @@ void AddFolderCommands(CLI::App &app, Context &context)
         AddCommand(*folder, context, "remove",
                    "stop indexing folders; the last one stops fileindexd, a share's last one wipes its index",
                    [&context, paths]() { return Remove(context, *paths); });
+    AddWaitOption(*remove, context);
     AddPaths(*remove, context, *paths, "share-relative paths of indexed folders")->required();
 }
 

@@ -6,6 +6,7 @@
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
+#include "fileindex/error.h"
 #include "output.h"
 #include "path_encoding.h"
 
@@ -18,6 +19,28 @@ CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name
     command->add_flag("--json", context.json, "print one JSON document (docs/fileindexctl.md gives each shape)");
     command->callback([&context, run]() { context.action = run; });
     return command;
+}
+
+void AddWaitOption(CLI::App &command, Context &context)
+{
+    command.add_option("--wait", context.wait,
+                       "while another program holds the lock this command needs, try again for up to this many "
+                       "seconds (0: give up at once); a lock still busy then exits 75")
+        ->check(CLI::Range(0.0, 3600.0))
+        ->capture_default_str()
+        ->type_name("SECONDS");
+}
+
+bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
+                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure)
+{
+    if (fileindex_tool::RetryWhileBusy(lock == nullptr ? 0 : context.wait, call)) {
+        return true;
+    }
+    failure = lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK
+                  ? fileindex_tool::BusyFailure(what, *lock, context.wait)
+                  : fileindex_tool::LibraryFailure(what, withoutCode);
+    return false;
 }
 
 CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::string> &paths,
@@ -62,6 +85,10 @@ int main(int argc, char **argv)
     });
     app.footer("Every subcommand takes --json and has its own --help. Paths are share-relative, /<share>/<folder>, "
                "unless a subcommand says otherwise.\n"
+               "A busy lock: folder get/add/set/remove, share remove/rename/revive, pause and resume take their "
+               "lock before they do anything, so they try again while another program holds it, for up to --wait "
+               "seconds. The other subcommands take no lock of their own, or may have done part of their work "
+               "when they meet one, and fail at once.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
                "code and what to try), 2 wrong command line, 4 no such share, path or folder, 75 a lock stayed "
                "busy.");

@@ -23,6 +23,8 @@ namespace fileindexctl {
 
 using namespace VEXO::FILEINDEX;
 using fileindex_tool::ClearLastError;
+using fileindex_tool::Failure;
+using fileindex_tool::kFolderListLock;
 using fileindex_tool::LibraryFailure;
 using fileindex_tool::SetBytesMember;
 using fileindex_tool::TerminalText;
@@ -111,8 +113,10 @@ int Remove(const Context &context, const std::string &share)
     if (!ListFolders(before, share)) {
         return Report(context, LibraryFailure(What("remove", share), kReadHint));
     }
-    if (!IndexMgr::ShareRemove(share)) {
-        return Report(context, LibraryFailure(What("remove", share), kReadHint));
+    Failure failure;
+    if (!RunWaiting(context, &kFolderListLock, What("remove", share), kReadHint,
+                    [&share]() { return IndexMgr::ShareRemove(share); }, failure)) {
+        return Report(context, failure);
     }
     if (context.json) {
         PrintJson(fileindex_tool::FolderRecords(before));
@@ -125,10 +129,16 @@ int Remove(const Context &context, const std::string &share)
 
 int Rename(const Context &context, const std::string &from, const std::string &to)
 {
+    const std::string what = What("rename", from) + " " + TerminalText(to);
+    Failure failure;
+    if (!RunWaiting(context, &kFolderListLock, what, kReadHint,
+                    [&from, &to]() { return IndexMgr::ShareRename(from, to); }, failure)) {
+        return Report(context, failure);
+    }
     ClearLastError();
     std::vector<Folder> after;
-    if (!IndexMgr::ShareRename(from, to) || !ListFolders(after, to)) {
-        return Report(context, LibraryFailure(What("rename", from) + " " + TerminalText(to), kReadHint));
+    if (!ListFolders(after, to)) {
+        return Report(context, LibraryFailure(what, kReadHint));
     }
     if (context.json) {
         PrintJson(fileindex_tool::FolderRecords(after));
@@ -140,48 +150,52 @@ int Rename(const Context &context, const std::string &from, const std::string &t
     return kSuccess;
 }
 
-// A share subcommand that is one library call: what it calls, what a failure may mean, and the line
-// printed on success.
+// A share subcommand that is one library call: what it calls, the lock it takes before anything
+// else (retried under --wait; null for none), what a failure may mean, and the line printed on
+// success.
 struct ShareAction {
     const char *name;
     const char *description;
     bool (*call)(const std::string &share);
+    const fileindex_tool::LockFile *lock;
     const char *failureHint;
     const char *doneLine;
 };
 
 const ShareAction kShareActions[] = {
     {"pause", "stop indexing the share: fileindexd deletes its worker, change monitoring removed",
-     IndexMgr::SharePause,
+     IndexMgr::SharePause, nullptr,
      "fileindexd did not take the command, or the share's change monitoring could not be removed",
      "fileindexd told to delete its worker, change monitoring removed"},
     {"resume", "index the share again: change monitoring registered, fileindexd revives its worker",
-     IndexMgr::ShareResume,
+     IndexMgr::ShareResume, nullptr,
      "the share's change monitoring could not be registered, or fileindexd did not take the command",
      "change monitoring registered, fileindexd told to revive its worker"},
-    {"clean", "wipe the share's event queue and index database", IndexMgr::CleanShareIndexData,
+    {"clean", "wipe the share's event queue and index database", IndexMgr::CleanShareIndexData, nullptr,
      kUnknownShareHint, "event queue and index database removed"},
     {"revive", "clear the share's out-of-space mark and tell fileindexd to revive the share's worker",
-     StatusMgr::ShareRevive, kDaemonHint, "out-of-space mark cleared, fileindexd told to revive its worker"},
+     StatusMgr::ShareRevive, &fileindex_tool::kStatusLock, kDaemonHint, "out-of-space mark cleared, fileindexd told to revive its worker"},
 };
 
 int RunShareAction(const Context &context, const ShareAction &action, const std::string &share)
 {
-    ClearLastError();
-    if (!action.call(share)) {
-        return Report(context, LibraryFailure(What(action.name, share), action.failureHint));
+    Failure failure;
+    const auto call = [&action, &share]() { return action.call(share); };
+    if (!RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure)) {
+        return Report(context, failure);
     }
     return Done(context, share, action.doneLine);
 }
 
 // Adds "share <name> SHARE" running run(context, share).
-void AddShareCommand(CLI::App &share, Context &context, const std::string &name, const std::string &description,
-                     std::function<int(const Context &, const std::string &)> run)
+CLI::App *AddShareCommand(CLI::App &share, Context &context, const std::string &name, const std::string &description,
+                          std::function<int(const Context &, const std::string &)> run)
 {
     auto shareName = std::make_shared<std::string>();
-    AddCommand(share, context, name, description, [&context, run, shareName]() { return run(context, *shareName); })
-        ->add_option("SHARE", *shareName, "share name")
-        ->required();
+    CLI::App *command = AddCommand(share, context, name, description,
+                                   [&context, run, shareName]() { return run(context, *shareName); });
+    command->add_option("SHARE", *shareName, "share name")->required();
+    return command;
 }
 
 }  // namespace
@@ -191,19 +205,25 @@ void AddShareCommands(CLI::App &app, Context &context)
     CLI::App *share = app.add_subcommand("share", "shared folders: remove, rename, pause, resume, clean, revive, "
                                                   "space, paths");
     share->require_subcommand(1);
-    AddShareCommand(*share, context, "remove", "the share is gone: drop its folder settings (the last ones stop "
-                                               "fileindexd)", Remove);
+    AddWaitOption(*AddShareCommand(*share, context, "remove",
+                                   "the share is gone: drop its folder settings (the last ones stop fileindexd)",
+                                   Remove),
+                  context);
     auto names = std::make_shared<std::pair<std::string, std::string>>();
     CLI::App *rename = AddCommand(*share, context, "rename",
                                   "the share was renamed (in the share database first): move its folder settings",
                                   [&context, names]() { return Rename(context, names->first, names->second); });
     rename->add_option("OLD", names->first, "the share's old name")->required();
     rename->add_option("NEW", names->second, "the share's new name")->required();
+    AddWaitOption(*rename, context);
     for (const ShareAction &action : kShareActions) {
-        AddShareCommand(*share, context, action.name, action.description,
-                        [&action](const Context &runContext, const std::string &shareName) {
-                            return RunShareAction(runContext, action, shareName);
-                        });
+        CLI::App *command = AddShareCommand(*share, context, action.name, action.description,
+                                            [&action](const Context &runContext, const std::string &shareName) {
+                                                return RunShareAction(runContext, action, shareName);
+                                            });
+        if (action.lock != nullptr) {
+            AddWaitOption(*command, context);
+        }
     }
     AddShareCommand(*share, context, "space",
                     "whether the share's volume has the 10 MiB indexing needs, and the share's marks", Space);

@@ -160,18 +160,19 @@ int ShowPauseState(const Context &context, const std::string &what)
 
 int Pause(const Context &context, int hours)
 {
-    ClearLastError();
-    if (!StatusMgr::Pause(hours)) {
-        return Report(context, LibraryFailure("pause", kDaemonHint));
+    fileindex_tool::Failure failure;
+    if (!RunWaiting(context, &fileindex_tool::kStatusLock, "pause", kDaemonHint,
+                    [hours]() { return StatusMgr::Pause(hours); }, failure)) {
+        return Report(context, failure);
     }
     return ShowPauseState(context, "pause");
 }
 
 int Resume(const Context &context)
 {
-    ClearLastError();
-    if (!StatusMgr::Resume()) {
-        return Report(context, LibraryFailure("resume", kDaemonHint));
+    fileindex_tool::Failure failure;
+    if (!RunWaiting(context, &fileindex_tool::kStatusLock, "resume", kDaemonHint, StatusMgr::Resume, failure)) {
+        return Report(context, failure);
     }
     return ShowPauseState(context, "resume");
 }
@@ -192,11 +193,14 @@ void AddStatusCommands(CLI::App &app, Context &context)
         ->check(CLI::PositiveNumber);
 
     auto hours = std::make_shared<int>(0);
-    AddCommand(app, context, "pause", "pause indexing and tell fileindexd",
-               [&context, hours]() { return Pause(context, *hours); })
-        ->add_option("--hours", *hours, "resume by itself after this many hours; 0 pauses until 'resume'")
+    CLI::App *pause = AddCommand(app, context, "pause", "pause indexing and tell fileindexd",
+                                 [&context, hours]() { return Pause(context, *hours); });
+    pause->add_option("--hours", *hours, "resume by itself after this many hours; 0 pauses until 'resume'")
         ->capture_default_str();
-    AddCommand(app, context, "resume", "resume indexing and tell fileindexd", [&context]() { return Resume(context); });
+    AddWaitOption(*pause, context);
+    AddWaitOption(*AddCommand(app, context, "resume", "resume indexing and tell fileindexd",
+                              [&context]() { return Resume(context); }),
+                  context);
 }
 
 }  // namespace fileindexctl
