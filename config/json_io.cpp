@@ -1,6 +1,8 @@
 // fromString, toString, fromFile and toFile: the library's four whole-document JSON operations.
 #include "config/json_io.h"
 
+#include <cerrno>
+#include <cmath>
 #include <memory>
 #include <sstream>
 
@@ -35,6 +37,28 @@ std::unique_ptr<Json::StreamWriter> NewCompactWriter()
     return std::unique_ptr<Json::StreamWriter>(builder.newStreamWriter());
 }
 
+// enclosing: the number of arrays and objects around value.
+bool ReadsBackAsWritten(const Json::Value &value, int enclosing)
+{
+    switch (value.type()) {
+    case Json::realValue:
+        return std::isfinite(value.asDouble());
+    case Json::arrayValue:
+    case Json::objectValue:
+        if (enclosing == kMaxJsonDepth) {
+            return false;
+        }
+        for (const Json::Value &element : value) {
+            if (!ReadsBackAsWritten(element, enclosing + 1)) {
+                return false;
+            }
+        }
+        return true;
+    default:
+        return true;
+    }
+}
+
 }  // namespace
 
 bool fromString(Json::Value &value, const std::string &text)
@@ -56,6 +80,11 @@ std::string toString(const Json::Value &value)
     return out.str();
 }
 
+bool ReadsBackAsWritten(const Json::Value &value)
+{
+    return ReadsBackAsWritten(value, 0);
+}
+
 bool fromFile(Json::Value &value, const std::string &path)
 {
     std::string text;
@@ -64,6 +93,10 @@ bool fromFile(Json::Value &value, const std::string &path)
 
 bool toFile(const Json::Value &value, const std::string &path)
 {
+    if (!ReadsBackAsWritten(value)) {
+        errno = EINVAL;
+        return false;
+    }
     return ReplaceFileAtomically(path, toString(value));
 }
 

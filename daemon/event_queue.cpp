@@ -7,7 +7,6 @@
 #include <cstdlib>
 
 #include "config/file_io.h"
-#include "config/json_io.h"
 #include "config/log.h"
 #include "daemon/event_queue.h"
 #include "daemon/queue_record.h"
@@ -107,11 +106,12 @@ bool AddCustomEvent(const int &event, const std::string &path, const Json::Value
         return true;
     }
 
-    Json::Value record(Json::objectValue);
-    record["event"] = event;
-    record["path"] = path;
-    record["data"] = data;
-    switch (AppendRecord(queue, toString(record) + "\n")) {
+    std::string line;
+    if (!MakeQueueRecordLine(event, path, data, line)) {
+        FILEIDX_LOG("%s:%d Refused a record its readers would skip, event=%d, path=%s", event, path.c_str());
+        return FallBackToReindex(share);
+    }
+    switch (AppendRecord(queue, line)) {
     case Append::kWritten:
     case Append::kContended:  // dropped on purpose: another writer is busy with this queue
         return true;

@@ -124,6 +124,24 @@ bool ParseQueueRecord(std::string_view line, QueueRecord &record)
     return members.Fill(record);
 }
 
+bool MakeQueueRecordLine(long long event, const std::string &path, const Json::Value &data, std::string &line)
+{
+    Json::Value record(Json::objectValue);
+    record["event"] = Json::Int64(event);
+    record["path"] = path;
+    record["data"] = data;
+    if (!ReadsBackAsWritten(record)) {
+        return false;
+    }
+    line = toString(record);
+    QueueRecord read;
+    if (!ParseQueueRecord(line, read)) {
+        return false;
+    }
+    line += '\n';
+    return true;
+}
+
 bool ParseQueueRecordAsJsonValue(std::string_view line, QueueRecord &record)
 {
     Json::Value value;

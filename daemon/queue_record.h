@@ -1,11 +1,14 @@
 // One line of a share's event queue file as the library reads it: {"event": kind, "path": path,
 // ...}, with "path_old" added by moves. The event queue's reindex search and the progress report
-// judge every line here, so that both skip exactly the same lines.
+// judge every line here, so that both skip exactly the same lines; and the line the library
+// appends is made here, and only when these readers read it back as written.
 #ifndef FILEINDEX_DAEMON_QUEUE_RECORD_H
 #define FILEINDEX_DAEMON_QUEUE_RECORD_H
 
 #include <string>
 #include <string_view>
+
+#include <json/value.h>
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -30,6 +33,12 @@ bool ParseQueueRecord(std::string_view line, QueueRecord &record);
 
 // The same judgement made on the line's Json::Value.
 bool ParseQueueRecordAsJsonValue(std::string_view line, QueueRecord &record);
+
+// The line AddCustomEvent appends: the text of {"event": event, "path": path, "data": data} and a
+// newline. False, with line unspecified, when the library's readers would not read it back as
+// written: an event ParseQueueRecord skips (below 0 or above 4294967295), or data that JSON text
+// cannot carry (ReadsBackAsWritten of json_io.h).
+bool MakeQueueRecordLine(long long event, const std::string &path, const Json::Value &data, std::string &line);
 
 }  // namespace FILEINDEX
 }  // namespace VEXO

@@ -11,13 +11,19 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <cmath>
 #include <limits>
 #include <set>
 
 #include "config/file_io.h"
+#include "config/json_grammar.h"
 #include "config/json_io.h"
+#include "daemon/queue_record.h"
 #include "fileindex/config.h"
 #include "fileindex/error.h"
+#include "fileindex/status.h"
+#include "fileindex/utils.h"
+#include "share/storage_paths.h"
 #include "tests/support/child.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/sandbox.h"
@@ -295,6 +301,87 @@ TEST_F(ConfigTest, SaverKilledMidSaveLeavesACompleteDocument)
     TestDoc doc;
     ASSERT_TRUE(doc.Save());
     EXPECT_TRUE(TempFilesBesideDoc().empty()) << "temporaries of killed savers are swept";
+}
+
+// What the library writes, its readers read back. An infinite number once went out as 1e+9999,
+// which no reader takes: the event was lost for good, and a document saved with one never loaded
+// again. NaN came back as null, and a negative event was skipped by every queue reader. Each value
+// now either reads back as it was written or is refused as a write that fails is: nothing written,
+// the event's share marked for a reindex, the previous document kept.
+TEST_F(ConfigTest, WhatTheLibraryWritesReadsBackOrIsNotWritten)
+{
+    DeclareShares("volume1/photo");
+    const std::string folder = SharePath("photo") + "/holiday";
+    const std::string queue = StoragePath(SharePath("photo"), kQueueFileName);
+    const auto nested = [](int levels) {
+        Json::Value value(Json::arrayValue);
+        for (int level = 1; level < levels; ++level) {
+            Json::Value outer(Json::arrayValue);
+            outer.append(std::move(value));
+            value = std::move(outer);
+        }
+        return value;
+    };
+    const double infinity = std::numeric_limits<double>::infinity();
+    const long long change = kEventFolderSettingChanged;
+    const struct {
+        const char *what;
+        long long event;
+        Json::Value data;
+        bool eventReads;  // the queue readers take the event
+        bool dataReads;   // JSON text carries the data, in a record as in a document
+    } rows[] = {
+        {"infinity", change, infinity, true, false},
+        {"-infinity", change, -infinity, true, false},
+        {"NaN", change, std::nan(""), true, false},
+        {"the largest double", change, std::numeric_limits<double>::max(), true, true},
+        {"event -1", -1, Json::Value(), false, true},
+        {"event 2^32 - 1", 0xFFFFFFFFLL, Json::Value(), true, true},
+        {"event 2^32", 0x100000000LL, Json::Value(), false, true},
+        {"a 1 MiB string", change, std::string(1 << 20, 's'), true, true},
+        {"nested to the readers' limit", change, nested(kMaxJsonDepth - 1), true, true},  // one level is the record's
+        {"nested one level past it", change, nested(kMaxJsonDepth), true, false},
+    };
+    for (const auto &row : rows) {
+        SCOPED_TRACE(row.what);
+        const bool recordReads = row.eventReads && row.dataReads;
+        std::string line;
+        ASSERT_EQ(MakeQueueRecordLine(row.event, folder, row.data, line), recordReads);
+        QueueRecord read;
+        if (recordReads) {
+            ASSERT_TRUE(ParseQueueRecord(line.substr(0, line.size() - 1), read));
+            EXPECT_EQ(read.event, static_cast<unsigned>(row.event));
+            EXPECT_EQ(ParseJson(line)["data"], row.data);
+        }
+        std::vector<std::string> logged;
+        LogCapture::Clear();
+        if (row.event >= std::numeric_limits<int>::min() && row.event <= std::numeric_limits<int>::max()) {
+            stdfs::remove(queue);
+            stdfs::remove(FILEINDEX_STATUS_CONF_PATH);
+            EXPECT_EQ(AddCustomEvent(static_cast<int>(row.event), folder, row.data), recordReads);
+            EXPECT_EQ(ReadFile(queue), recordReads ? line : "");
+            EXPECT_EQ(StatusMgr::ShareIsNeedReindex("photo"), !recordReads);
+            if (!recordReads) {
+                logged.push_back("Refused a record its readers would skip, event=" + std::to_string(row.event) +
+                                 ", path=" + folder);
+            }
+        }
+
+        TestDoc doc;
+        doc.Doc() = ParseJson(R"({"previous":true})");
+        ASSERT_TRUE(doc.Save());
+        doc.Doc()["data"] = row.data;
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        EXPECT_EQ(doc.Save(), row.dataReads);
+        EXPECT_EQ(ErrorHandler::GetError(), row.dataReads ? FILEIDX_ERR_NONE : FILEIDX_ERR_SAVE_CONFIG);
+        TestDoc loaded;
+        ASSERT_TRUE(loaded.Load());
+        EXPECT_EQ(loaded.Doc(), row.dataReads ? doc.Doc() : ParseJson(R"({"previous":true})"));
+        if (!row.dataReads) {
+            logged.push_back("Failed to save json to " + kDocPath);
+        }
+        EXPECT_EQ(LogCapture::Messages(), logged);
+    }
 }
 
 // A sweep that misread a temporary name would delete a live saver's file, or another document's, or

@@ -46,6 +46,8 @@ public:
     bool LoadJson();
     // Replaces GetPath() with the document atomically, then sets mode 0644. A write failure leaves
     // the previous file: false, error 7 (FILEIDX_ERR_SAVE_CONFIG), "Failed to save json to <path>".
+    // A document that LoadJson would not read back as it is (an infinite or NaN number, nesting
+    // deeper than 512 levels) is such a failure: it is never written.
     // A failed chmod only logs "chmod failed, path=<path>" and still counts as saved.
     // Does not check that the lock is held.
     bool SaveJson();

@@ -151,7 +151,10 @@ FILEINDEX_EXPORT bool SendCammandToDaemon(const std::string &type, const Json::V
 // locked through three attempts (the event is then dropped). When the event cannot be written
 // (path outside any share, queue unknown, not openable or a symbolic link, "@eaDir" a symbolic
 // link, flock error, append cut short) the share ("" when unknown) is marked as needing a reindex
-// instead, and the result is false.
+// instead, and the result is false. The library never appends a record its own queue readers would
+// skip or read as something else: a negative event, or data holding an infinite or NaN number or
+// nested deeper than 511 levels, is such an event that cannot be written ("Refused a record its
+// readers would skip, event=<event>, path=<path>", the share marked, false).
 // Debug lines at LOG_LEVEL 7 only: "flock fail, ...", "try lock too many times, ...",
 // "write fail, (<written>, <length>)". A queue file it creates gets mode 0644 (less the umask).
 FILEINDEX_EXPORT bool AddCustomEvent(const int &event, const std::string &path, const Json::Value &data);
