@@ -1,7 +1,8 @@
 // One line of a share's event queue, as every scan of a queue judges it. Whatever the line holds,
 // the reader answers without crashing or throwing, and exactly as the JSON library's reading of the
-// line does. A line it accepts says the same when written again as a record, and the same line cut
-// short anywhere, as a writer stopped mid-append leaves it, is never taken for a record.
+// line does. A line it accepts says the same when written again as a record, by hand and by the
+// library's own record writer, and the same line cut short anywhere, as a writer stopped
+// mid-append leaves it, is never taken for a record.
 #include <cstdlib>
 #include <string>
 
@@ -42,6 +43,16 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
     }
     QueueRecord again;
     if (!ParseQueueRecord(Rewritten(record), again) || !SameRecord(record, again)) {
+        abort();
+    }
+    // What the library appends for the record, with the line's own data, is a line it reads back.
+    Json::Value value;
+    fromString(value, line);
+    std::string appended;
+    QueueRecord appendedBack;
+    if (!MakeQueueRecordLine(record.event, record.path, value["data"], appended) ||
+        !ParseQueueRecord(appended, appendedBack) || appendedBack.event != record.event ||
+        appendedBack.path != record.path) {
         abort();
     }
     // Cuts spread over the line, the last one just before its closing brace.
