@@ -67,49 +67,106 @@ protected:
     }
 };
 
-// A failing call prints exactly one line on standard error that says what failed, what it means
-// and what to try, names the library's error code when there is one, and exits with the status of
-// its kind; standard output stays empty, or holds only the error object with --json.
+// A failing call prints exactly one line on standard error that says what failed, what it means and
+// what to try, names the library's error code when there is one and never "error 0", and exits with
+// the status of its kind; standard output stays empty, or holds only the same error as the error
+// object with --json. An unknown share, path or folder is one status (4) and one shape everywhere.
 TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
 {
     WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+    const std::string noShare = "share nosuch does not exist; the share database has no share of that name";
     struct Row {
         std::vector<std::string> args;
         int status;
         std::string line;  // regular expression for the one line on standard error
     } rows[] = {
         {{"folder", "get", "/photo/b"}, 4,
-         "fileindexctl: folder get /photo/b: the folder is not in the folder list; .*folder list.* "
-         "\\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
-        {{"pause", "--hours", "-1"}, 1, "fileindexctl: pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
-        {{"resume"}, 1,
-         "fileindexctl: resume: the change is saved, but fileindexd did not take the command: is the indexing "
-         "service running\\? .*"},
-        {{"share", "space", "nosuch"}, 4, "fileindexctl: share space nosuch: .* \\(FILEIDX_ERR_PATH\\)"},
-        {{"share", "paths", "nosuch"}, 1, "fileindexctl: share paths nosuch: .*not in the share database.*"},
-        {{"folder", "set", "/photo/b", "--audio", "on"}, 4, "fileindexctl: folder set /photo/b: .*"},
-        {{"folder", "add", "/nosuch/a"}, 1, "fileindexctl: folder add: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
-        {{"reindex", "/music"}, 1, "fileindexctl: reindex: .*holds no indexed.*"},
+         "folder get /photo/b: the folder is not in the folder list; .* \\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
+        {{"folder", "set", "/photo/b", "--audio", "on"}, 4,
+         "folder set /photo/b: the folder is not in the folder list; .* \\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
+        {{"folder", "remove", "/photo/a", "/photo/b"}, 4,
+         "folder remove: /photo/b is not in the folder list; .* \\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
+        {{"folder", "add", "/nosuch/a"}, 4, "folder add: " + noShare + " \\(FILEIDX_ERR_PATH\\)"},
+        {{"folder", "add", "/photo/nonexistent"}, 4,
+         "folder add: /photo/nonexistent does not exist; .* \\(FILEIDX_ERR_PATH\\)"},
+        {{"status", "/nosuch"}, 4, "status: " + noShare + " \\(FILEIDX_ERR_PATH\\)"},
+        {{"reindex", "/photo/nonexistent"}, 4, "reindex: /photo/nonexistent does not exist; .*"},
+        {{"reindex", "/music"}, 4,
+         "reindex: /music is not an indexed folder, nor inside or above one; .* \\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},
+        {{"share", "remove", "nosuch"}, 4,
+         "share remove nosuch: share nosuch does not exist and holds no folder settings; .* \\(FILEIDX_ERR_PATH\\)"},
+        {{"share", "rename", "nosuch", "music"}, 4, "share rename nosuch music: share nosuch does not exist and .*"},
+        {{"share", "rename", "photo", "nosuch"}, 4, "share rename photo nosuch: " + noShare + " .*"},
+        {{"share", "revive", "nosuch"}, 4, "share revive nosuch: " + noShare + " .*"},
+        {{"share", "pause", "nosuch"}, 4, "share pause nosuch: " + noShare + " .*"},
+        {{"share", "resume", "nosuch"}, 4, "share resume nosuch: " + noShare + " .*"},
+        {{"share", "clean", "nosuch"}, 4, "share clean nosuch: " + noShare + " .*"},
+        {{"share", "space", "nosuch"}, 4, "share space nosuch: " + noShare + " .*"},
+        {{"share", "paths", "nosuch"}, 4, "share paths nosuch: " + noShare + " .*"},
+        {{"pause", "--hours", "-1"}, 1, "pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"resume"}, 1, "resume: the change is saved, but fileindexd did not take the command: is the indexing "
+                        "service running\\? .*"},
     };
     for (const Row &row : rows) {
         const Outcome outcome = Ctl(row.args);
         SCOPED_TRACE(row.line);
         EXPECT_EQ(outcome.status, row.status);
         EXPECT_EQ(outcome.out, "");
-        EXPECT_TRUE(std::regex_match(outcome.err, std::regex(row.line + "\n"))) << outcome.err;
+        EXPECT_TRUE(std::regex_match(outcome.err, std::regex("fileindexctl: " + row.line + "\n"))) << outcome.err;
         EXPECT_EQ(outcome.err.find("error 0"), std::string::npos);
-        // With --json the same failure is also the error object on standard output.
         std::vector<std::string> jsonArgs = row.args;
         jsonArgs.push_back("--json");
         const Json::Value error = ParseJson(Ctl(jsonArgs).out)["error"];
         const std::string named = error["name"].isNull() ? "" : " (" + error["name"].asString() + ")";
-        EXPECT_TRUE(std::regex_match("fileindexctl: " + error["message"].asString() + named, std::regex(row.line)));
+        EXPECT_TRUE(std::regex_match(error["message"].asString() + named, std::regex(row.line)));
     }
     // A wrong command line is not the library's failure: status 2, and one line all the same.
     const Outcome usage = Ctl({"folder", "get"});
     EXPECT_EQ(usage.status, 2);
     EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
         << usage.err;
+    EXPECT_EQ(ReadFile(kFolderConf), R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+}
+
+// A folder is stored under its normalised path, and only when it exists and may be indexed, as
+// check says, unless --force: no duplicates through a trailing "/", no folders that can never finish.
+TEST_F(FileindexctlTest, FolderPathsAreCheckedBeforeTheyAreSaved)
+{
+    FrameListener daemon;
+    for (const char *folder : {"/holiday", "/#recycle"}) {
+        stdfs::create_directories(SharePath("photo") + folder);
+    }
+    const std::string refusal = ParseJson(Ctl({"check", "/photo/#recycle", "--json"}).out)[0]["refusal_text"].asString();
+    const struct Row {
+        std::vector<std::string> args;
+        int status;
+        std::string error;  // a part of standard error
+    } rows[] = {
+        {{"folder", "add", "/photo/holiday/", "--photo"}, 0, ""},
+        {{"folder", "add", "/photo/./holiday"}, 2, "has a \".\" or \"..\" component"},
+        {{"folder", "add", "/photo/../music"}, 2, "has a \".\" or \"..\" component"},
+        {{"folder", "add", "/photo//holiday"}, 2, "has an empty component"},
+        {{"folder", "add", "photo/holiday"}, 2, "is not a share-relative path"},
+        {{"folder", "add", "/photo/" + std::string(100000, 'x')}, 2, "longer than the 4095 bytes"},
+        {{"folder", "add", "/photo/#recycle"}, 3, "folder add: /photo/#recycle may not be indexed: " + refusal + ";"},
+        {{"folder", "add", "/photo/#recycle", "--force"}, 0, ""},
+        {{"folder", "add", "/photo/nonexistent", "--force"}, 0, ""},
+        {{"folder", "add", "/nosuch/a", "--force"}, 4, "share nosuch does not exist"},
+        {{"folder", "set", "/photo/holiday/", "--name", "Holiday"}, 0, ""},
+        {{"folder", "set", "/photo/#recycle", "--name", "Bin"}, 3, "may not be indexed: " + refusal},
+        {{"folder", "set", "/photo/#recycle", "--name", "Bin", "--force"}, 0, ""},
+        {{"folder", "set", "/photo/./holiday", "--name", "X"}, 2, "has a \".\" or \"..\" component"},
+    };
+    for (const Row &row : rows) {
+        const Outcome outcome = Ctl(row.args);
+        SCOPED_TRACE(row.args[1] + " " + row.args[2].substr(0, 40));
+        EXPECT_EQ(outcome.status, row.status) << outcome.err;
+        EXPECT_NE(outcome.err.find(row.error), std::string::npos) << outcome.err;
+    }
+    const Json::Value conf = ParseJson(ReadFile(kFolderConf));
+    EXPECT_EQ(conf.getMemberNames(), (std::vector<std::string>{"/photo/#recycle", "/photo/holiday", "/photo/nonexistent"}));
+    EXPECT_EQ(conf["/photo/holiday"]["name"], "Holiday");
+    EXPECT_EQ(conf["/photo/#recycle"]["name"], "Bin");
 }
 
 // A busy lock is not a failure. The commands whose lock comes before any effect try again until the

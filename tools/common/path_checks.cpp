@@ -98,6 +98,32 @@ bool CheckPathExists(const std::string &what, const std::string &path, Failure &
                   what + ": " + TerminalText(path) + " does not exist; check the folder's name in the share");
 }
 
+bool CheckShareKnown(const std::string &what, const std::string &share, const std::vector<Folder> &folders,
+                     Failure &failure)
+{
+    for (const Folder &folder : folders) {
+        std::string folderShare;
+        if (GetShareNameByPath(folderShare, folder.m_path) && folderShare == share) {
+            return true;
+        }
+    }
+    if (CheckShareExists(what, share, failure)) {
+        return true;
+    }
+    if (failure.kind == FailureKind::kNotFound) {
+        failure.message = what + ": share " + TerminalText(share) + " does not exist and holds no folder settings; "
+                          "the share database has no share of that name";
+    }
+    return false;
+}
+
+Failure NotInFolderList(const std::string &what, const std::string &path)
+{
+    return ToolFailure(FailureKind::kNotFound, FILEIDX_ERR_NO_SUCH_FOLDER,
+                       what + ": " + TerminalText(path) + " is not in the folder list; the folder list shows the "
+                       "indexed folders");
+}
+
 bool CheckMayBeIndexed(const std::string &what, const std::string &path, Failure &failure)
 {
     const IndexRefusal refusal = GetPathIndexRefusal(path);

@@ -7,8 +7,10 @@
 #define FILEINDEX_TOOL_PATH_CHECKS_H
 
 #include <string>
+#include <vector>
 
 #include "failure.h"
+#include "fileindex/folder.h"
 
 namespace fileindex_tool {
 
@@ -24,6 +26,15 @@ bool CheckShareExists(const std::string &what, const std::string &share, Failure
 // The path's share exists (as above) and so does the path itself, as a directory or any other
 // entry (kNotFound, code 2, "<path> does not exist").
 bool CheckPathExists(const std::string &what, const std::string &path, Failure &failure);
+
+// The share is in the share database or holds folder settings in folders (a share that is gone
+// from the database may still have settings to remove or move). Refused as CheckShareExists, with
+// "share <name> does not exist and holds no folder settings".
+bool CheckShareKnown(const std::string &what, const std::string &share,
+                     const std::vector<VEXO::FILEINDEX::Folder> &folders, Failure &failure);
+
+// A path that is not in the folder list: kNotFound, code 4, "<path> is not in the folder list".
+Failure NotInFolderList(const std::string &what, const std::string &path);
 
 // The library's indexability rules accept the path as a folder to index (kRefused, "<path> may not
 // be indexed: <the rule's text>", the text fileindexctl check gives).

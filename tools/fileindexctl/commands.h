@@ -41,10 +41,11 @@ bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, co
 // percent-encoded bytes (path_encoding.h).
 CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::string> &paths,
                       const std::string &description);
-// The path arguments as the library takes them: decoded under --path-bytes. False, with the
-// failure (kInvalid), for an argument that is not percent-encoded text.
+// The path arguments as the library takes them: decoded under --path-bytes, trailing "/" removed,
+// and, asFolders, refused unless they have the form a folder is stored under (NormaliseFolderPath).
+// False, with the failure (kInvalid), for an argument that is neither.
 bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
-               fileindex_tool::Failure &failure);
+               fileindex_tool::Failure &failure, bool asFolders = true);
 
 void AddFolderCommands(CLI::App &app, Context &context);
 void AddIndexCommands(CLI::App &app, Context &context);

@@ -8,8 +8,10 @@
 #include "commands.h"
 #include "failure.h"
 #include "fileindex/index_mgr.h"
+#include "fileindex/utils.h"
 #include "folder_output.h"
 #include "output.h"
+#include "path_checks.h"
 #include "path_encoding.h"
 #include "records.h"
 
@@ -39,17 +41,30 @@ struct SettingOptions {
     std::array<bool, kMedia.size()> media = {};           // the value given for each medium
     std::array<CLI::Option *, kMedia.size()> given = {};  // whether it was given at all
     CLI::Option *nameGiven = nullptr;
+    bool force = false;  // --force: store paths that do not exist or may not be indexed
 };
 
-// The last component of a share-relative path: what a new folder is called unless named.
+// The last component of a normalised share-relative path: what a new folder is called unless named.
 std::string LastComponent(const std::string &path)
 {
-    const size_t slash = path.find_last_of('/', path.size() > 1 ? path.size() - 2 : 0);
-    std::string name = slash == std::string::npos ? path : path.substr(slash + 1);
-    if (!name.empty() && name.back() == '/') {
-        name.pop_back();
+    return path.substr(path.find_last_of('/') + 1);
+}
+
+// Each path's share exists; without --force the path exists too and may be indexed, by the rules
+// and with the words of fileindexctl check.
+bool CheckSettingPaths(const std::string &what, const SettingOptions &options, Failure &failure)
+{
+    for (const std::string &path : options.paths) {
+        std::string share;
+        VEXO::FILEINDEX::GetShareNameByPath(share, path);
+        const bool accepted = options.force ? fileindex_tool::CheckShareExists(what, share, failure)
+                                            : fileindex_tool::CheckPathExists(what, path, failure) &&
+                                                  fileindex_tool::CheckMayBeIndexed(what, path, failure);
+        if (!accepted) {
+            return false;
+        }
     }
-    return name;
+    return true;
 }
 
 // One request element per path: "path", and the name and media the command line gave; folder add
@@ -93,7 +108,8 @@ int ShowStored(const Context &context, const std::string &what, const std::strin
 int Add(const Context &context, SettingOptions &options)
 {
     Failure failure;
-    if (!TakePaths(context, "folder add", options.paths, failure)) {
+    if (!TakePaths(context, "folder add", options.paths, failure) ||
+        !CheckSettingPaths("folder add", options, failure)) {
         return Report(context, failure);
     }
     const Json::Value request = SettingRequest(options, true);
@@ -105,7 +121,8 @@ int Add(const Context &context, SettingOptions &options)
 }
 
 // Changes what the command line gives of a folder already in the list; an unknown path fails with
-// the library's FILEIDX_ERR_NO_SUCH_FOLDER instead of being added.
+// the library's FILEIDX_ERR_NO_SUCH_FOLDER instead of being added. The path is checked as folder add
+// checks it.
 int Set(const Context &context, SettingOptions &options)
 {
     Failure failure;
@@ -117,6 +134,7 @@ int Set(const Context &context, SettingOptions &options)
     const Json::Value request = SettingRequest(options, false);
     if (!RunWaiting(context, &kFolderListLock, what, kReadHint,
                     [&record, &options]() { return IndexMgr::Get(record, options.paths.front()); }, failure) ||
+        !CheckSettingPaths(what, options, failure) ||
         !RunWaiting(context, &kFolderListLock, what, kFollowUpHint, [&request]() { return IndexMgr::Set(request); },
                     failure)) {
         return Report(context, failure);
@@ -135,6 +153,11 @@ int Remove(const Context &context, std::vector<std::string> &paths)
     if (!ListFolders(before)) {
         return Report(context, LibraryFailure("folder remove", kReadHint));
     }
+    for (const std::string &path : paths) {
+        if (FoldersAt(before, {path}).empty()) {
+            return Report(context, fileindex_tool::NotInFolderList("folder remove", path));
+        }
+    }
     const Json::Value request = PathArray(paths);
     if (!RunWaiting(context, &kFolderListLock, "folder remove", kFollowUpHint,
                     [&request]() { return IndexMgr::Delete(request); }, failure)) {
@@ -145,9 +168,6 @@ int Remove(const Context &context, std::vector<std::string> &paths)
         PrintJson(fileindex_tool::FolderRecords(removed));
     } else {
         PrintFolderLines("removed", removed);
-        if (removed.size() < paths.size()) {
-            std::cout << paths.size() - removed.size() << " of the paths were not in the folder list\n";
-        }
     }
     return kSuccess;
 }
@@ -240,6 +260,8 @@ void AddSettingCommand(CLI::App &folder, Context &context, bool adding)
             ->expected(1);
         options->nameGiven = command->add_option("--name", options->name, "display name");
     }
+    command->add_flag("--force", options->force,
+                      "store the path even when it does not exist or may not be indexed (its share must exist)");
     for (size_t i = 0; i < kMedia.size(); ++i) {
         const std::string flag = std::string("--") + kMedia[i];
         options->given[i] = adding ? command->add_flag(flag, options->media[i], std::string("index ") + kMedia[i])

@@ -7,10 +7,12 @@
 #include "check_report.h"
 #include "commands.h"
 #include "failure.h"
+#include "fileindex/error.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
 #include "folder_output.h"
 #include "output.h"
+#include "path_checks.h"
 #include "path_encoding.h"
 #include "records.h"
 
@@ -50,7 +52,7 @@ void PrintCheck(const std::string &path, const Json::Value &check)
 int Check(const Context &context, std::vector<std::string> &paths)
 {
     Failure failure;
-    if (!TakePaths(context, "check", paths, failure)) {
+    if (!TakePaths(context, "check", paths, failure, false)) {
         return Report(context, failure);
     }
     Json::Value checks(Json::arrayValue);
@@ -73,12 +75,22 @@ int Reindex(const Context &context, std::vector<std::string> &paths)
     if (!TakePaths(context, "reindex", paths, failure)) {
         return Report(context, failure);
     }
+    for (const std::string &path : paths) {
+        if (!fileindex_tool::CheckPathExists("reindex", path, failure)) {
+            return Report(context, failure);
+        }
+        if (!IndexMgr::IsPathIndexed(path) && !IndexMgr::IsPathContainIndexed(path)) {
+            return Report(context, fileindex_tool::ToolFailure(
+                                       fileindex_tool::FailureKind::kNotFound, FILEIDX_ERR_NO_SUCH_FOLDER,
+                                       "reindex: " + TerminalText(path) + " is not an indexed folder, nor inside or "
+                                       "above one; the folder list shows the indexed folders"));
+        }
+    }
     const Json::Value request = PathArray(paths);
     ClearLastError();
     if (!IndexMgr::Reindex(request)) {
-        return Report(context, LibraryFailure("reindex", "a path's share holds no indexed folder (which logs "
-                                                         "nothing), or an event could not be queued (the system log "
-                                                         "names it)"));
+        return Report(context, LibraryFailure("reindex", "an event could not be queued; the system log names the "
+                                                         "path"));
     }
     if (context.json) {
         Json::Value queued(Json::arrayValue);

@@ -8,6 +8,7 @@
 #include "commands.h"
 #include "fileindex/error.h"
 #include "output.h"
+#include "path_checks.h"
 #include "path_encoding.h"
 
 namespace fileindexctl {
@@ -52,18 +53,21 @@ CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::stri
 }
 
 bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
-               fileindex_tool::Failure &failure)
+               fileindex_tool::Failure &failure, bool asFolders)
 {
-    if (!context.pathBytes) {
-        return true;
-    }
     for (std::string &path : paths) {
-        if (!fileindex_tool::PercentDecode(path, path)) {
+        if (context.pathBytes && !fileindex_tool::PercentDecode(path, path)) {
             failure = fileindex_tool::ToolFailure(
                 fileindex_tool::FailureKind::kInvalid, fileindex_tool::Failure::kNoCode,
                 what + ": " + fileindex_tool::TerminalText(path) + " is not percent-encoded (a \"%\" must be "
                 "followed by two hex digits); --path-bytes takes the \"path_bytes\" form of the JSON records");
             return false;
+        }
+        if (asFolders && !fileindex_tool::NormaliseFolderPath(what, path, path, failure)) {
+            return false;
+        }
+        while (path.size() > 1 && path.back() == '/') {
+            path.pop_back();
         }
     }
     return true;
@@ -90,8 +94,8 @@ int main(int argc, char **argv)
                "seconds. The other subcommands take no lock of their own, or may have done part of their work "
                "when they meet one, and fail at once.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
-               "code and what to try), 2 wrong command line, 4 no such share, path or folder, 75 a lock stayed "
-               "busy.");
+               "code and what to try), 2 wrong command line, 3 the path may not be indexed, 4 no such share, "
+               "path or folder, 75 a lock stayed busy.");
 
     Context context;
     AddFolderCommands(app, context);

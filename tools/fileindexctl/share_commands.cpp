@@ -16,6 +16,7 @@
 #include "fileindex/utils.h"
 #include "folder_output.h"
 #include "output.h"
+#include "path_checks.h"
 #include "path_encoding.h"
 #include "records.h"
 
@@ -49,10 +50,11 @@ Json::Value ShareDocument(const std::string &share)
 
 int Space(const Context &context, const std::string &share)
 {
-    ClearLastError();
+    Failure failure;
     std::string fullPath;
-    if (!GetFullPath(fullPath, "/" + share)) {
-        return Report(context, LibraryFailure(What("space", share), kUnknownShareHint));
+    if (!fileindex_tool::CheckShareExists(What("space", share), share, failure) ||
+        !GetFullPath(fullPath, "/" + share)) {
+        return Report(context, failure);
     }
     Json::Value document = fileindex_tool::ShareMarks(share);
     document["space_enough"] = IsShareSpaceEnough(share);
@@ -76,7 +78,10 @@ std::string Presence(const std::string &path)
 
 int Paths(const Context &context, const std::string &share)
 {
-    ClearLastError();
+    Failure failure;
+    if (!fileindex_tool::CheckShareExists(What("paths", share), share, failure)) {
+        return Report(context, failure);
+    }
     char queue[4096];
     char database[4096];
     if (FILEIDXQueuePathGet(share.c_str(), queue, sizeof(queue)) < 0 ||
@@ -114,6 +119,9 @@ int Remove(const Context &context, const std::string &share)
         return Report(context, LibraryFailure(What("remove", share), kReadHint));
     }
     Failure failure;
+    if (!fileindex_tool::CheckShareKnown(What("remove", share), share, before, failure)) {
+        return Report(context, failure);
+    }
     if (!RunWaiting(context, &kFolderListLock, What("remove", share), kReadHint,
                     [&share]() { return IndexMgr::ShareRemove(share); }, failure)) {
         return Report(context, failure);
@@ -131,6 +139,15 @@ int Rename(const Context &context, const std::string &from, const std::string &t
 {
     const std::string what = What("rename", from) + " " + TerminalText(to);
     Failure failure;
+    std::vector<Folder> before;
+    ClearLastError();
+    if (!ListFolders(before, from)) {
+        return Report(context, LibraryFailure(what, kReadHint));
+    }
+    if (!fileindex_tool::CheckShareKnown(what, from, before, failure) ||
+        !fileindex_tool::CheckShareExists(what, to, failure)) {
+        return Report(context, failure);
+    }
     if (!RunWaiting(context, &kFolderListLock, what, kReadHint,
                     [&from, &to]() { return IndexMgr::ShareRename(from, to); }, failure)) {
         return Report(context, failure);
@@ -181,7 +198,8 @@ int RunShareAction(const Context &context, const ShareAction &action, const std:
 {
     Failure failure;
     const auto call = [&action, &share]() { return action.call(share); };
-    if (!RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure)) {
+    if (!fileindex_tool::CheckShareExists(What(action.name, share), share, failure) ||
+        !RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure)) {
         return Report(context, failure);
     }
     return Done(context, share, action.doneLine);

@@ -15,6 +15,7 @@
 #include "failure.h"
 #include "fileindex/status.h"
 #include "output.h"
+#include "path_checks.h"
 #include "path_encoding.h"
 #include "status_report.h"
 
@@ -122,6 +123,11 @@ int Status(const Context &context, StatusOptions &options)
     fileindex_tool::Failure failure;
     if (!TakePaths(context, "status", options.paths, failure)) {
         return Report(context, failure);
+    }
+    for (const std::string &path : options.paths) {
+        if (!fileindex_tool::CheckPathExists("status", path, failure)) {
+            return Report(context, failure);
+        }
     }
     if (options.watch) {
         return Watch(context, options);
