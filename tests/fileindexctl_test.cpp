@@ -103,7 +103,10 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         {{"share", "clean", "nosuch"}, 4, "share clean nosuch: " + noShare + " .*"},
         {{"share", "space", "nosuch"}, 4, "share space nosuch: " + noShare + " .*"},
         {{"share", "paths", "nosuch"}, 4, "share paths nosuch: " + noShare + " .*"},
-        {{"pause", "--hours", "-1"}, 1, "pause: .* \\(FILEIDX_ERR_BAD_PARAM\\)"},
+        {{"pause", "--hours", "-1"}, 2, "pause --hours: -1 hours is negative; .*"},
+        {{"pause", "--hours", "100000"}, 2,
+         "pause --hours: a pause of 100000 hours would end after 2038-01-19 03:14:07 UTC, the last time "
+         "status.conf can hold; the largest is [0-9]+ hours \\(until 2038-01-19 .*\\), or 0 to pause until resumed"},
         {{"resume"}, 1, "resume: the change is saved, but fileindexd did not take the command: is the indexing "
                         "service running\\? .*"},
     };
@@ -126,6 +129,18 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
     EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
         << usage.err;
     EXPECT_EQ(ReadFile(kFolderConf), R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+}
+
+// The end of a timed pause is stored in 32 bits: the longest pause the refusal names still ends
+// after now, where one hour more would have wrapped to 1901.
+TEST_F(FileindexctlTest, TheLongestPauseTheRefusalNamesEndsInTheFuture)
+{
+    FrameListener daemon;
+    const std::string refused = Ctl({"pause", "--hours", "200000"}).err;
+    std::smatch largest;
+    ASSERT_TRUE(std::regex_search(refused, largest, std::regex("the largest is ([0-9]+) hours")));
+    EXPECT_EQ(Ctl({"pause", "--hours", largest[1]}).status, 0);
+    EXPECT_GT(ParseJson(ReadFile(FILEINDEX_STATUS_CONF_PATH))["resume_time"].asInt64(), time(nullptr));
 }
 
 // A folder is stored under its normalised path, and only when it exists and may be indexed, as

@@ -17,6 +17,7 @@
 #include "output.h"
 #include "path_checks.h"
 #include "path_encoding.h"
+#include "pause_hours.h"
 #include "status_report.h"
 
 namespace fileindexctl {
@@ -164,11 +165,12 @@ int ShowPauseState(const Context &context, const std::string &what)
     return kSuccess;
 }
 
-int Pause(const Context &context, int hours)
+int Pause(const Context &context, long long hours)
 {
     fileindex_tool::Failure failure;
-    if (!RunWaiting(context, &fileindex_tool::kStatusLock, "pause", kDaemonHint,
-                    [hours]() { return StatusMgr::Pause(hours); }, failure)) {
+    if (!fileindex_tool::CheckPauseHours("pause --hours", hours, failure) ||
+        !RunWaiting(context, &fileindex_tool::kStatusLock, "pause", kDaemonHint,
+                    [hours]() { return StatusMgr::Pause(static_cast<int>(hours)); }, failure)) {
         return Report(context, failure);
     }
     return ShowPauseState(context, "pause");
@@ -198,7 +200,7 @@ void AddStatusCommands(CLI::App &app, Context &context)
         ->capture_default_str()
         ->check(CLI::PositiveNumber);
 
-    auto hours = std::make_shared<int>(0);
+    auto hours = std::make_shared<long long>(0);
     CLI::App *pause = AddCommand(app, context, "pause", "pause indexing and tell fileindexd",
                                  [&context, hours]() { return Pause(context, *hours); });
     pause->add_option("--hours", *hours, "resume by itself after this many hours; 0 pauses until 'resume'")
