@@ -14,13 +14,6 @@ FILEIDX_LOG_UNIT("utils.cpp");
 namespace VEXO {
 namespace FILEINDEX {
 
-namespace {
-
-constexpr int kShareNameSize = 492;
-constexpr int kSharePathSize = 4096;
-
-}  // namespace
-
 bool GetShareNameByPath(std::string &share, const std::string &path)
 {
     if (path.empty()) {

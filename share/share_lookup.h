@@ -9,6 +9,9 @@
 namespace VEXO {
 namespace FILEINDEX {
 
+constexpr int kShareNameSize = 492;
+constexpr int kSharePathSize = 4096;
+
 // The share holding a full path and the share's own path (VEXOShareNamePathGet). Failure: false,
 // outputs untouched, "VEXOShareNamePathGet failed, path=<path>"; no error code is set.
 bool FindShareOfFullPath(std::string &share, std::string &sharePath, const std::string &fullPath);

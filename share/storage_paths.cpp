@@ -19,7 +19,6 @@ namespace FILEINDEX {
 
 namespace {
 
-constexpr int kSharePathSize = 4096;
 constexpr int kPlatformBadParameter = 0x0D00;
 
 // Formats S/@eaDir/<name> of the share into out (truncated to its size), making S/@eaDir (through
