@@ -1,3 +1,4 @@
+// Who holds a busy configuration lock, the wait for its release, and the failure when it stays busy.
 #include "busy.h"
 
 #include <sys/stat.h>

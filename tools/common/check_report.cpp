@@ -1,3 +1,4 @@
+// The report of what the index makes of a path, for fileindexctl check and the panel.
 #include "check_report.h"
 
 #include "fileindex/index_mgr.h"

@@ -1,3 +1,4 @@
+// The tools' failure reports: kind, library error code and the what/meaning/advice message.
 #include "failure.h"
 
 #include <algorithm>

@@ -1,3 +1,4 @@
+// The tools' checks of share names and share-relative paths before they reach the library.
 #include "path_checks.h"
 
 #include <sys/stat.h>

@@ -1,3 +1,4 @@
+// The tools' encodings of byte strings: JSON "path"/"path_bytes", percent-encoding, terminal quoting.
 #include "path_encoding.h"
 
 #include <cstdio>

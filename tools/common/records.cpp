@@ -1,3 +1,4 @@
+// The JSON records the tools print and serve, built from the library's records.
 #include "records.h"
 
 #include <set>

@@ -1,3 +1,4 @@
+// The tools' indexing progress report: pause state, folder states, share marks, daemon reachability.
 #include "status_report.h"
 
 #include <fcntl.h>

@@ -1,3 +1,4 @@
+// fileindexctl's reading and human display of folder settings.
 #include "folder_output.h"
 
 #include <algorithm>

@@ -1,3 +1,4 @@
+// fileindexctl's printing: human tables and lines, the --json document, failures and exit statuses.
 #include "output.h"
 
 #include <algorithm>
