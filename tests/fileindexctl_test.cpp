@@ -74,6 +74,7 @@ protected:
 TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
 {
     WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+    stdfs::create_directories(SharePath("photo") + "/a");
     const std::string noShare = "share nosuch does not exist; the share database has no share of that name";
     struct Row {
         std::vector<std::string> args;
@@ -107,8 +108,12 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         {{"pause", "--hours", "100000"}, 2,
          "pause --hours: a pause of 100000 hours would end after 2038-01-19 03:14:07 UTC, the last time "
          "status.conf can hold; the largest is [0-9]+ hours \\(until 2038-01-19 .*\\), or 0 to pause until resumed"},
-        {{"resume"}, 1, "resume: the change is saved, but fileindexd did not take the command: is the indexing "
-                        "service running\\? .*"},
+        // Saved, but fileindexd could not be told: status 5, what stands and what to do.
+        {{"resume"}, 5, "resume: fileindexd was not told: no socket at .*: the indexing service is not running; "
+                        "status.conf is saved; start the indexing service, then run the same command again"},
+        {{"folder", "add", "/photo/a"}, 5, "folder add: fileindexd was not told: no socket at .*; folder.conf is "
+                                           "saved; start .*"},
+        {{"share", "pause", "photo"}, 5, "share pause photo: fileindexd was not told: .*; nothing changed; start .*"},
     };
     for (const Row &row : rows) {
         const Outcome outcome = Ctl(row.args);
@@ -128,7 +133,7 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
     EXPECT_EQ(usage.status, 2);
     EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
         << usage.err;
-    EXPECT_EQ(ReadFile(kFolderConf), R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+    EXPECT_EQ(ParseJson(ReadFile(kFolderConf)).getMemberNames(), std::vector<std::string>{"/photo/a"});
 }
 
 // The end of a timed pause is stored in 32 bits: the longest pause the refusal names still ends
@@ -293,6 +298,7 @@ TEST_F(FileindexctlTest, FolderAddedIsIndexedWhileWatchedAndRemovedAgain)
     commands["fileindexd"]["ready"] = FILEINDEX_DAEMON_SOCKET_PATH;
     WriteFile(StatePath("service_commands.json"), VEXO::FILEINDEX::toString(commands));
 
+    EXPECT_NE(Ctl({"status"}).out.find("\nfileindexd: not reachable: no socket at "), std::string::npos);
     const Outcome added = Ctl({"folder", "add", "/photo", "--photo", "--json"});
     EXPECT_EQ(added.status, 0) << added.err;
     EXPECT_EQ(ParseJson(added.out), ParseJson(R"([{"path": "/photo", "path_bytes": "/photo", "name": "photo",
@@ -301,6 +307,7 @@ TEST_F(FileindexctlTest, FolderAddedIsIndexedWhileWatchedAndRemovedAgain)
     const Outcome watched = Ctl({"status", "--watch", "--interval", "0.05", "--json"});
     const Json::Value report = ParseJson(watched.out);
     EXPECT_EQ(report["status"], "finished");
+    EXPECT_EQ(report["daemon"]["reachable"], true);
     EXPECT_EQ(report["folders"], ParseJson(R"([{"path": "/photo", "path_bytes": "/photo", "status": "finished"}])"));
     EXPECT_EQ(ReadFile(frames), "{\"data\":{\"folder_path\":\"/photo\"},\"type\":\"upsert_folder_setting\"}\n");
     EXPECT_NE(ReadFile(SharePath("photo") + "/@eaDir/VEXO@.fileindexdb/index.jsonl").find("131072"),

@@ -1,14 +1,6 @@
 // The tools' indexing progress report: pause state, folder states, share marks, daemon reachability.
 #include "status_report.h"
 
-#include <fcntl.h>
-#include <sys/socket.h>
-#include <sys/un.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstring>
-
 #include "appliance_paths.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
@@ -22,33 +14,6 @@ using VEXO::FILEINDEX::IndexMgr;
 using VEXO::FILEINDEX::StatusMgr;
 
 const char *const kFolderStates[4] = {"finished", "processing", "paused", "err_no_space"};
-
-DaemonState ProbeDaemon()
-{
-    const std::string socketPath = FILEINDEX_DAEMON_SOCKET_PATH;
-    DaemonState state;
-    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
-    if (fd < 0) {
-        state.problem = std::string("no socket could be made: ") + strerror(errno);
-        return state;
-    }
-    sockaddr_un address = {};
-    address.sun_family = AF_UNIX;
-    strncpy(address.sun_path, socketPath.c_str(), sizeof(address.sun_path) - 1);
-    if (connect(fd, reinterpret_cast<const sockaddr *>(&address), sizeof(address)) == 0) {
-        state.reachable = true;
-    } else if (errno == ENOENT) {
-        state.problem = "no socket at " + TerminalText(socketPath) + ": the indexing service is not running";
-    } else if (errno == ECONNREFUSED) {
-        state.problem = "nobody listens on " + TerminalText(socketPath) + ": the indexing service has stopped";
-    } else if (errno == EAGAIN) {
-        state.problem = "fileindexd takes no more connections on " + TerminalText(socketPath) + " (its backlog is full)";
-    } else {
-        state.problem = "cannot connect to " + TerminalText(socketPath) + ": " + strerror(errno);
-    }
-    close(fd);
-    return state;
-}
 
 bool TakeStatusReport(const std::vector<std::string> &paths, StatusReport &report)
 {

@@ -9,18 +9,9 @@
 
 #include <json/value.h>
 
-namespace fileindex_tool {
+#include "daemon_probe.h"
 
-// Whether fileindexd takes connections on its socket. problem says why not: no socket (the
-// service is not running), nobody listening (it stopped without removing its socket), or its
-// backlog is full; empty when reachable.
-struct DaemonState {
-    bool reachable = false;
-    std::string problem;
-};
-// Connects to the daemon's socket without waiting and closes the connection without sending
-// anything (fileindexd takes a connection without a frame as nothing).
-DaemonState ProbeDaemon();
+namespace fileindex_tool {
 
 struct FolderState {
     std::string path;

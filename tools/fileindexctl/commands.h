@@ -32,10 +32,12 @@ void AddWaitOption(CLI::App &command, Context &context);
 // Runs call, and again while it fails because another process holds lock and --wait has not run
 // out. lock is the lock the operation takes before it does anything, so that a lock failure leaves
 // nothing behind; null for an operation that takes none of its own, or may have done part of its
-// work when it meets one: it runs once. On failure, failure is BusyFailure when the lock stayed busy,
-// otherwise LibraryFailure(what, withoutCode).
+// work when it meets one: it runs once. On failure, failure is BusyFailure when the lock stayed busy;
+// for an operation that tells fileindexd (daemonState not null: what stands when fileindexd was not
+// told, "" for nothing to say), DaemonFailure; otherwise LibraryFailure(what, withoutCode).
 bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
-                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure);
+                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
+                const char *daemonState = nullptr);
 
 // Adds the PATH arguments of a subcommand, and the --path-bytes flag that reads them as
 // percent-encoded bytes (path_encoding.h).

@@ -31,6 +31,7 @@ const char kFollowUpHint[] = "a step that sets no error code failed (an empty pa
                              "change monitoring, the service start, a daemon command, an event); the system log "
                              "names it";
 const char kReadHint[] = "the library recorded no reason; the system log has its line";
+const char kSaved[] = "folder.conf is saved";
 
 constexpr std::array<const char *, 4> kMedia = {"document", "audio", "video", "photo"};
 
@@ -114,7 +115,7 @@ int Add(const Context &context, SettingOptions &options)
     }
     const Json::Value request = SettingRequest(options, true);
     if (!RunWaiting(context, &kFolderListLock, "folder add", kFollowUpHint, [&request]() { return IndexMgr::Add(request); },
-                    failure)) {
+                    failure, kSaved)) {
         return Report(context, failure);
     }
     return ShowStored(context, "folder add", "added", options.paths);
@@ -136,7 +137,7 @@ int Set(const Context &context, SettingOptions &options)
                     [&record, &options]() { return IndexMgr::Get(record, options.paths.front()); }, failure) ||
         !CheckSettingPaths(what, options, failure) ||
         !RunWaiting(context, &kFolderListLock, what, kFollowUpHint, [&request]() { return IndexMgr::Set(request); },
-                    failure)) {
+                    failure, kSaved)) {
         return Report(context, failure);
     }
     return ShowStored(context, "folder set", "changed", options.paths);
@@ -160,7 +161,7 @@ int Remove(const Context &context, std::vector<std::string> &paths)
     }
     const Json::Value request = PathArray(paths);
     if (!RunWaiting(context, &kFolderListLock, "folder remove", kFollowUpHint,
-                    [&request]() { return IndexMgr::Delete(request); }, failure)) {
+                    [&request]() { return IndexMgr::Delete(request); }, failure, kSaved)) {
         return Report(context, failure);
     }
     const std::vector<Folder> removed = FoldersAt(before, paths);

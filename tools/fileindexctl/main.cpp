@@ -6,6 +6,7 @@
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
+#include "daemon_probe.h"
 #include "fileindex/error.h"
 #include "output.h"
 #include "path_checks.h"
@@ -33,14 +34,19 @@ void AddWaitOption(CLI::App &command, Context &context)
 }
 
 bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
-                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure)
+                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
+                const char *daemonState)
 {
     if (fileindex_tool::RetryWhileBusy(lock == nullptr ? 0 : context.wait, call)) {
         return true;
     }
-    failure = lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK
-                  ? fileindex_tool::BusyFailure(what, *lock, context.wait)
-                  : fileindex_tool::LibraryFailure(what, withoutCode);
+    if (lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
+        failure = fileindex_tool::BusyFailure(what, *lock, context.wait);
+    } else if (daemonState != nullptr) {
+        failure = fileindex_tool::DaemonFailure(what, daemonState, withoutCode);
+    } else {
+        failure = fileindex_tool::LibraryFailure(what, withoutCode);
+    }
     return false;
 }
 
@@ -95,7 +101,7 @@ int main(int argc, char **argv)
                "when they meet one, and fail at once.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
                "code and what to try), 2 wrong command line, 3 the path may not be indexed, 4 no such share, "
-               "path or folder, 75 a lock stayed busy.");
+               "path or folder, 5 fileindexd was not told (the line says what stands), 75 a lock stayed busy.");
 
     Context context;
     AddFolderCommands(app, context);

@@ -20,7 +20,7 @@ constexpr int kFailure = 1;         // a library call failed
 constexpr int kUsage = 2;           // the command line is wrong, or a path or value in it
 constexpr int kRefused = 3;         // check: a path may not be indexed; folder add/set: refused for that
 constexpr int kNotFound = 4;        // no such share, path or folder
-constexpr int kDaemonNotTold = 5;   // the change is saved, but fileindexd did not take the command
+constexpr int kDaemonNotTold = 5;   // fileindexd was not told; the message says what stands
 constexpr int kBusy = 75;           // a lock stayed busy until --wait ran out (sysexits' EX_TEMPFAIL)
 constexpr int kInterrupted = 130;
 
@@ -45,10 +45,6 @@ private:
 };
 
 std::string YesNo(bool value);
-
-// What to try when a status change was saved but its daemon command was not taken.
-constexpr char kDaemonHint[] =
-    "the change is saved, but fileindexd did not take the command: is the indexing service running? Retry once it is";
 
 }  // namespace fileindexctl
 

@@ -168,7 +168,8 @@ int Rename(const Context &context, const std::string &from, const std::string &t
 }
 
 // A share subcommand that is one library call: what it calls, the lock it takes before anything
-// else (retried under --wait; null for none), what a failure may mean, and the line printed on
+// else (retried under --wait; null for none), what a failure without a code may mean, what stands
+// when fileindexd was not told (null for a call that does not talk to it), and the line printed on
 // success.
 struct ShareAction {
     const char *name;
@@ -176,22 +177,24 @@ struct ShareAction {
     bool (*call)(const std::string &share);
     const fileindex_tool::LockFile *lock;
     const char *failureHint;
+    const char *daemonState;
     const char *doneLine;
 };
 
 const ShareAction kShareActions[] = {
     {"pause", "stop indexing the share: fileindexd deletes its worker, change monitoring removed",
-     IndexMgr::SharePause, nullptr,
-     "fileindexd did not take the command, or the share's change monitoring could not be removed",
-     "fileindexd told to delete its worker, change monitoring removed"},
+     IndexMgr::SharePause, nullptr, "the share's change monitoring could not be removed; the system log says why",
+     "nothing changed", "fileindexd told to delete its worker, change monitoring removed"},
     {"resume", "index the share again: change monitoring registered, fileindexd revives its worker",
      IndexMgr::ShareResume, nullptr,
-     "the share's change monitoring could not be registered, or fileindexd did not take the command",
-     "change monitoring registered, fileindexd told to revive its worker"},
+     "the share's change monitoring could not be registered, or fileindexd did not take the command; the system "
+     "log says which",
+     "", "change monitoring registered, fileindexd told to revive its worker"},
     {"clean", "wipe the share's event queue and index database", IndexMgr::CleanShareIndexData, nullptr,
-     kUnknownShareHint, "event queue and index database removed"},
+     kUnknownShareHint, nullptr, "event queue and index database removed"},
     {"revive", "clear the share's out-of-space mark and tell fileindexd to revive the share's worker",
-     StatusMgr::ShareRevive, &fileindex_tool::kStatusLock, kDaemonHint, "out-of-space mark cleared, fileindexd told to revive its worker"},
+     StatusMgr::ShareRevive, &fileindex_tool::kStatusLock, kReadHint, "the out-of-space mark is cleared",
+     "out-of-space mark cleared, fileindexd told to revive its worker"},
 };
 
 int RunShareAction(const Context &context, const ShareAction &action, const std::string &share)
@@ -199,7 +202,8 @@ int RunShareAction(const Context &context, const ShareAction &action, const std:
     Failure failure;
     const auto call = [&action, &share]() { return action.call(share); };
     if (!fileindex_tool::CheckShareExists(What(action.name, share), share, failure) ||
-        !RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure)) {
+        !RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure,
+                    action.daemonState)) {
         return Report(context, failure);
     }
     return Done(context, share, action.doneLine);

@@ -57,6 +57,7 @@ struct StatusOptions {
 };
 
 const char kReadHint[] = "the library recorded no reason; the system log has its line";
+const char kStatusSaved[] = "status.conf is saved";
 
 std::string ReportText(const StatusReport &report)
 {
@@ -66,7 +67,8 @@ std::string ReportText(const StatusReport &report)
         const std::string until = PauseText(report.resumeTime);
         text << (report.status == "paused" ? " " + until : " (paused " + until + ")");
     }
-    text << "\n";
+    text << "\nfileindexd: " << (report.daemon.reachable ? "running, reachable" : "not reachable: " + report.daemon.problem)
+         << "\n";
     if (!report.folders.empty()) {
         Table table({"FOLDER", "STATUS"});
         for (const fileindex_tool::FolderState &folder : report.folders) {
@@ -169,8 +171,8 @@ int Pause(const Context &context, long long hours)
 {
     fileindex_tool::Failure failure;
     if (!fileindex_tool::CheckPauseHours("pause --hours", hours, failure) ||
-        !RunWaiting(context, &fileindex_tool::kStatusLock, "pause", kDaemonHint,
-                    [hours]() { return StatusMgr::Pause(static_cast<int>(hours)); }, failure)) {
+        !RunWaiting(context, &fileindex_tool::kStatusLock, "pause", kReadHint,
+                    [hours]() { return StatusMgr::Pause(static_cast<int>(hours)); }, failure, kStatusSaved)) {
         return Report(context, failure);
     }
     return ShowPauseState(context, "pause");
@@ -179,7 +181,8 @@ int Pause(const Context &context, long long hours)
 int Resume(const Context &context)
 {
     fileindex_tool::Failure failure;
-    if (!RunWaiting(context, &fileindex_tool::kStatusLock, "resume", kDaemonHint, StatusMgr::Resume, failure)) {
+    if (!RunWaiting(context, &fileindex_tool::kStatusLock, "resume", kReadHint, StatusMgr::Resume, failure,
+                    kStatusSaved)) {
         return Report(context, failure);
     }
     return ShowPauseState(context, "resume");
