@@ -4,7 +4,8 @@
 #   ./dev.sh demo                      build and run the demo on the emulated platform
 #   ./dev.sh test [--werror] [--sanitize]
 #                                      build and run every test (--sanitize: under ASan + UBSan)
-#   ./dev.sh package                   build the Debian packages into build/dev/packages and check them
+#   ./dev.sh package                   build the Debian packages into build/package/packages and
+#                                      check them, lintian included
 #   ./dev.sh fuzz [--werror]           build the fuzz targets with clang and run each on a fixed
 #                                      number of inputs from its seeds in fuzz/corpus
 #   ./dev.sh bench [repetitions]       optimised build, run the benchmarks, print the table of
@@ -13,7 +14,7 @@ set -euo pipefail
 cd "$(dirname "$0")"
 
 packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev
-          help2man dpkg-dev file libbenchmark-dev jq)
+          help2man dpkg-dev file libbenchmark-dev jq lintian abigail-tools)
 # Added for the fuzz targets: clang and its fuzzer and sanitizer runtimes.
 fuzz_packages=(clang libclang-rt-dev)
 
@@ -85,10 +86,10 @@ test)
     ;;
 package)
     install_missing_packages
-    build dev
-    rm -rf build/dev/packages
-    cpack --config build/dev/CPackConfig.cmake
-    packaging/check_packages.sh build/dev
+    build package
+    rm -rf build/package/packages
+    cpack --config build/package/CPackConfig.cmake
+    packaging/check_packages.sh build/package
     ;;
 fuzz)
     werror=OFF
@@ -108,7 +109,7 @@ bench)
     bench/run.sh "$@"
     ;;
 *)
-    sed -n '2,11p' "$0" | sed 's/^# \{0,1\}//'
+    sed -n '2,12p' "$0" | sed 's/^# \{0,1\}//'
     exit 2
     ;;
 esac

@@ -1,11 +1,14 @@
 #!/usr/bin/env bash
 # Checks the Debian packages that cpack wrote for a build: every file `cmake --install` installs is
-# in exactly one package, and every library of this project that a packaged program or library
-# loads comes from its own package or from one it depends on.
+# in exactly one package, every library of this project that a packaged program or library loads
+# comes from its own package or from one it depends on, and lintian, pedantic, finds no error and
+# no warning in any package (the -dbgsym ones included), while every info or pedantic tag it still
+# reports is listed with its reason in the README.
 #
-#   check_packages.sh BUILD_DIR      (the packages are BUILD_DIR/packages/*.deb)
+#   check_packages.sh BUILD_DIR      (the packages are BUILD_DIR/packages/*.deb and *.ddeb)
 set -euo pipefail
 build=$1
+readme=$(dirname "$0")/../README.md
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 
@@ -52,7 +55,24 @@ for directory in "$work"/packages/*; do
     done
 done
 
+# "SEVERITY: PACKAGE: TAG DETAILS" for every finding.
+# Exit status 2: a finding of a severity in --fail-on; 1: lintian itself failed.
+status=0
+lintian --pedantic --display-info --fail-on error,warning "${debs[@]}" "$build"/packages/*.ddeb \
+    >"$work/lintian.txt" 2>"$work/lintian.err" || status=$?
+if [ $status -eq 2 ]; then
+    grep -E '^[EW]: ' "$work/lintian.txt"
+    report "lintian reports the errors and warnings above"
+elif [ $status -ne 0 ]; then
+    cat "$work/lintian.err"
+    report "lintian failed (exit status $status)"
+fi
+for tag in $(sed -n 's/^[IP]: [^ ]* \([^ ]*\).*/\1/p' "$work/lintian.txt" | sort -u); do
+    grep -q "| \`$tag\` |" "$readme" || report "lintian reports $tag, which the README's table of lintian tags does not list: $(grep -m1 " $tag" "$work/lintian.txt")"
+done
+
 if [ $failed -eq 0 ]; then
-    echo "Packages checked: ${#debs[@]}, $(wc -l <"$work/packaged.txt") files, each in one package, with their dependencies."
+    echo "Packages checked: ${#debs[@]}, $(wc -l <"$work/packaged.txt") files, each in one package, with their dependencies;"
+    echo "lintian: no error or warning, $(grep -c '^[IP]: ' "$work/lintian.txt") info and pedantic findings, each tag listed in the README."
 fi
 exit $failed

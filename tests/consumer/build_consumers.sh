@@ -16,15 +16,18 @@ prefix=$work/prefix
 
 cmake --install "$build" --prefix "$prefix" >/dev/null
 libdir=$(dirname "$(find "$prefix" -name libfileindex.so)")
-# Off the standard directories the loader and the linker are told where the libraries are.
-export LD_LIBRARY_PATH=$libdir
 export PKG_CONFIG_PATH=$libdir/pkgconfig
 
+# Built exactly as the README says, with nothing but the prefix named: the linker finds the
+# library's own libraries (the emulated platform) through what the package tells it.
+unset LD_LIBRARY_PATH LIBRARY_PATH
 cmake -S "$here/find_package" -B "$work/cmake" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build "$work/cmake" >/dev/null
 cc -o "$work/flat_client" "$interface/flat_client.c" $(pkg-config --cflags --libs fileindex)
 c++ -std=c++17 -o "$work/class_client" "$interface/class_client.cpp" $(pkg-config --cflags --libs fileindex)
 
+# Off the standard directories the loader is told where the libraries are, as the README says.
+export LD_LIBRARY_PATH=$libdir
 for program in cmake/flat_client cmake/class_client flat_client class_client; do
     cmake -DROOT="$root" -DPROGRAM="$work/$program" -P "$interface/run_in_appliance.cmake"
 done
