@@ -2,10 +2,12 @@
 #include <fcntl.h>
 #include <signal.h>
 #include <sys/file.h>
+#include <sys/ioctl.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cstring>
 #include <regex>
 #include <string>
 #include <vector>
@@ -28,6 +30,16 @@ struct Outcome {
     std::string err;
 };
 
+// How a run sees the world besides its arguments: its standard output on a terminal (a
+// pseudo-terminal of rows lines with TERM=term) or a file, and whether it is interrupted (SIGINT)
+// after a while.
+struct Setting {
+    bool terminal = false;
+    std::string term;
+    unsigned short rows = 24;
+    int interruptAfterMilliseconds = -1;
+};
+
 class FileindexctlTest : public SandboxTest {
 protected:
     void SetUp() override
@@ -39,9 +51,10 @@ protected:
     // A stand-in daemon a test started through the service start does not outlive the test.
     void TearDown() override { VLIBServiceStop("fileindexd", 1); }
 
-    // Runs fileindexctl with args, its output and error streams going to files of the sandbox. A run
-    // that hangs is ended after a time limit, and then reads as killed.
-    static Outcome Ctl(const std::vector<std::string> &args)
+    // Runs fileindexctl with args, its output and error streams going to files of the sandbox (or
+    // the terminal's output to out). A run that hangs is ended after a time limit, and then reads as
+    // killed.
+    static Outcome Ctl(const std::vector<std::string> &args, const Setting &setting = Setting())
     {
         const std::string out = HostPath("/ctl.out"), err = HostPath("/ctl.err");
         std::vector<char *> argv{const_cast<char *>(FILEINDEXCTL)};
@@ -49,21 +62,53 @@ protected:
             argv.push_back(const_cast<char *>(arg.c_str()));
         }
         argv.push_back(nullptr);
+        std::vector<std::string> variables{"TERM=" + setting.term};
+        std::vector<char *> envp{const_cast<char *>(variables[0].c_str())};
+        for (char **variable = environ; *variable != nullptr; ++variable) {
+            if (strncmp(*variable, "TERM=", 5) != 0) {
+                envp.push_back(*variable);
+            }
+        }
+        envp.push_back(nullptr);
+        int terminal = -1;
+        if (setting.terminal) {
+            terminal = posix_openpt(O_RDWR | O_NOCTTY | O_NONBLOCK);
+            const struct winsize size = {setting.rows, 80, 0, 0};
+            EXPECT_TRUE(terminal >= 0 && grantpt(terminal) == 0 && unlockpt(terminal) == 0 &&
+                        ioctl(terminal, TIOCSWINSZ, &size) == 0);
+        }
         posix_spawn_file_actions_t files;
         posix_spawn_file_actions_init(&files);
-        posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, setting.terminal ? ptsname(terminal) : out.c_str(),
+                                         setting.terminal ? O_RDWR | O_NOCTTY : O_WRONLY | O_CREAT | O_TRUNC, 0644);
         posix_spawn_file_actions_addopen(&files, STDERR_FILENO, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
         pid_t pid = -1;
-        EXPECT_EQ(posix_spawn(&pid, FILEINDEXCTL, &files, nullptr, argv.data(), environ), 0);
+        EXPECT_EQ(posix_spawn(&pid, FILEINDEXCTL, &files, nullptr, argv.data(), envp.data()), 0);
         posix_spawn_file_actions_destroy(&files);
+        std::string shown;
+        const auto readTerminal = [terminal, &shown]() {
+            char buffer[4096];
+            for (ssize_t got; terminal >= 0 && (got = read(terminal, buffer, sizeof(buffer))) > 0;) {
+                shown.append(buffer, static_cast<size_t>(got));
+            }
+        };
         int status = 0;
         for (int waited = 0; waitpid(pid, &status, WNOHANG) == 0; ++waited) {
+            if (waited * 10 == setting.interruptAfterMilliseconds) {
+                kill(pid, SIGINT);
+            }
             if (waited == kRunLimitMilliseconds / 10) {
                 kill(pid, SIGKILL);
             }
+            readTerminal();
             usleep(10000);
         }
-        return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status), ReadFile(out), ReadFile(err)};
+        readTerminal();
+        if (terminal >= 0) {
+            close(terminal);
+        }
+        return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status),
+                setting.terminal ? shown : ReadFile(out), ReadFile(err)};
     }
 };
 
@@ -129,10 +174,19 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         EXPECT_TRUE(std::regex_match(error["message"].asString() + named, std::regex(row.line)));
     }
     // A wrong command line is not the library's failure: status 2, and one line all the same.
-    const Outcome usage = Ctl({"folder", "get"});
-    EXPECT_EQ(usage.status, 2);
-    EXPECT_TRUE(std::regex_match(usage.err, std::regex("fileindexctl: [^\n]*PATH[^\n]* \\(see --help\\)\n")))
-        << usage.err;
+    const struct Usage {
+        std::vector<std::string> args;
+        std::string line;  // regular expression
+    } usages[] = {
+        {{"folder", "get"}, "[^\n]*PATH[^\n]*"},
+        {{"status", "--watch", "--interval", "0"}, "--interval: '0' is not a number of seconds from 0.05 to 3600"},
+    };
+    for (const Usage &usage : usages) {
+        const Outcome outcome = Ctl(usage.args);
+        EXPECT_EQ(outcome.status, 2);
+        EXPECT_TRUE(std::regex_match(outcome.err, std::regex("fileindexctl: " + usage.line + " \\(see --help\\)\n")))
+            << outcome.err;
+    }
     EXPECT_EQ(ParseJson(ReadFile(kFolderConf)).getMemberNames(), std::vector<std::string>{"/photo/a"});
 }
 
@@ -187,6 +241,49 @@ TEST_F(FileindexctlTest, FolderPathsAreCheckedBeforeTheyAreSaved)
     EXPECT_EQ(conf.getMemberNames(), (std::vector<std::string>{"/photo/#recycle", "/photo/holiday", "/photo/nonexistent"}));
     EXPECT_EQ(conf["/photo/holiday"]["name"], "Holiday");
     EXPECT_EQ(conf["/photo/#recycle"]["name"], "Bin");
+}
+
+// status --watch while indexing is paused with work pending, as a person sees it: on a terminal it
+// redraws on the alternate screen (nothing piles up in the scrollback), each drawing cut to the
+// window with the summary first, and leaves the whole status behind; on TERM=dumb or a file it
+// prints plain lines. Either way it says why it waits, and Ctrl-C ends it with 130.
+TEST_F(FileindexctlTest, StatusWatchRedrawsInPlaceOnlyOnATerminal)
+{
+    Json::Value conf(Json::objectValue);
+    for (int i = 10; i < 40; ++i) {
+        const std::string path = "/photo/f" + std::to_string(i);
+        stdfs::create_directories(SharePath("photo") + path.substr(6));
+        conf[path]["name"] = path.substr(7);
+    }
+    WriteFile(kFolderConf, VEXO::FILEINDEX::toString(conf));
+    stdfs::create_directories(SharePath("photo") + "/@eaDir");
+    WriteFile(SharePath("photo") + "/@eaDir/VEXO@file_index_queue",
+              "{\"event\":131072,\"path\":\"" + SharePath("photo") + "/f10/a.jpg\",\"data\":null}\n");
+    WriteFile(FILEINDEX_STATUS_CONF_PATH, R"({"resume_time":0})");
+    const std::string summary = "indexing: paused until resumed\n"
+                                "fileindexd: not reachable: no socket at [^\\n]*\n"
+                                "30 folders: 29 finished, 0 processing, 1 paused, 0 out of space\n"
+                                "waiting: indexing is paused until resumed; 'fileindexctl resume' resumes it\n";
+    const std::string table = "FOLDER +STATUS\n/photo/f10 +paused\n(/photo/f[1-3][0-9] +finished\n){29}";
+    const struct Row {
+        Setting setting;
+        std::string shown;  // regular expression for what standard output received, without "\r"
+    } rows[] = {
+        {{true, "xterm", 8, 400},
+         "\x1b\\[\\?1049h\x1b\\[\\?7l\x1b\\[\\?25l(\x1b\\[H" + std::regex_replace(summary, std::regex("\n"), "\x1b\\[K\n") +
+             "FOLDER +STATUS\x1b\\[K\n/photo/f10 +paused\x1b\\[K\n\\.\\.\\. 29 more lines; a taller window shows "
+             "them\x1b\\[K\n\x1b\\[J)+"
+             "\x1b\\[\\?25h\x1b\\[\\?7h\x1b\\[\\?1049l" + summary + table},
+        {{true, "dumb", 8, 400}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
+        {{false, "xterm", 24, 400}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
+    };
+    for (const Row &row : rows) {
+        SCOPED_TRACE(row.setting.term + (row.setting.terminal ? " terminal" : " file"));
+        const Outcome watched = Ctl({"status", "--watch", "--interval", "0.05"}, row.setting);
+        EXPECT_EQ(watched.status, 130);
+        const std::string shown = std::regex_replace(watched.out, std::regex("\r"), "");
+        EXPECT_TRUE(std::regex_match(shown, std::regex(row.shown))) << shown;
+    }
 }
 
 // A busy lock is not a failure. The commands whose lock comes before any effect try again until the

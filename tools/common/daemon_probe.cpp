@@ -1,3 +1,4 @@
+// Whether fileindexd takes connections, and the failure of a change it was not told of.
 #include "daemon_probe.h"
 
 #include <sys/socket.h>

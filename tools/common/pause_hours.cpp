@@ -1,3 +1,4 @@
+// How long a timed pause may last, and the refusal of one whose end the status file cannot hold.
 #include "pause_hours.h"
 
 #include <cstdint>

@@ -39,6 +39,17 @@ bool TakeStatusReport(const std::vector<std::string> &paths, StatusReport &repor
     return true;
 }
 
+std::array<int, 4> CountFolderStates(const StatusReport &report)
+{
+    std::array<int, 4> counts = {};
+    for (const FolderState &folder : report.folders) {
+        for (size_t i = 0; i < counts.size(); ++i) {
+            counts[i] += folder.status == kFolderStates[i] ? 1 : 0;
+        }
+    }
+    return counts;
+}
+
 Json::Value StatusRecord(const StatusReport &report)
 {
     Json::Value record;
@@ -48,8 +59,9 @@ Json::Value StatusRecord(const StatusReport &report)
     SetBytesMember(daemon, "socket", FILEINDEX_DAEMON_SOCKET_PATH);
     daemon["reachable"] = report.daemon.reachable;
     daemon["problem"] = report.daemon.reachable ? Json::Value() : Json::Value(report.daemon.problem);
-    for (const char *state : kFolderStates) {
-        record["counts"][state] = 0;
+    const std::array<int, 4> counts = CountFolderStates(report);
+    for (size_t i = 0; i < counts.size(); ++i) {
+        record["counts"][kFolderStates[i]] = counts[i];
     }
     record["folders"] = Json::Value(Json::arrayValue);
     for (const FolderState &folder : report.folders) {
@@ -57,9 +69,6 @@ Json::Value StatusRecord(const StatusReport &report)
         SetBytesMember(entry, "path", folder.path);
         entry["status"] = folder.status;
         record["folders"].append(entry);
-        if (record["counts"].isMember(folder.status)) {
-            record["counts"][folder.status] = record["counts"][folder.status].asInt() + 1;
-        }
     }
     record["shares"] = Json::Value(Json::arrayValue);
     for (const std::string &share : report.shares) {

@@ -4,6 +4,7 @@
 #ifndef FILEINDEX_TOOL_STATUS_REPORT_H
 #define FILEINDEX_TOOL_STATUS_REPORT_H
 
+#include <array>
 #include <string>
 #include <vector>
 
@@ -37,8 +38,10 @@ bool TakeStatusReport(const std::vector<std::string> &paths, StatusReport &repor
 // marks are read as the record is built.
 Json::Value StatusRecord(const StatusReport &report);
 
-// The folder states counted in "counts", in that order.
+// The folder states counted in "counts", in that order, and how many of the report's folders are
+// in each.
 extern const char *const kFolderStates[4];
+std::array<int, 4> CountFolderStates(const StatusReport &report);
 
 }  // namespace fileindex_tool
 

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cstdlib>
 #include <ctime>
 #include <iostream>
 #include <memory>
@@ -18,6 +19,7 @@
 #include "path_checks.h"
 #include "path_encoding.h"
 #include "pause_hours.h"
+#include "status_output.h"
 #include "status_report.h"
 
 namespace fileindexctl {
@@ -30,26 +32,6 @@ using VEXO::FILEINDEX::StatusMgr;
 
 namespace {
 
-volatile sig_atomic_t g_interrupted = 0;
-
-void OnInterrupt(int)
-{
-    g_interrupted = 1;
-}
-
-// "until resumed", or "until <local time>" for a timed pause.
-std::string PauseText(long long resumeTime)
-{
-    if (resumeTime == 0) {
-        return "until resumed";
-    }
-    const time_t when = static_cast<time_t>(resumeTime);
-    char text[64];
-    struct tm local;
-    strftime(text, sizeof(text), "%Y-%m-%d %H:%M:%S %Z", localtime_r(&when, &local));
-    return std::string("until ") + text;
-}
-
 struct StatusOptions {
     std::vector<std::string> paths;  // the folders to show; every indexed folder when empty
     bool watch = false;
@@ -58,68 +40,6 @@ struct StatusOptions {
 
 const char kReadHint[] = "the library recorded no reason; the system log has its line";
 const char kStatusSaved[] = "status.conf is saved";
-
-std::string ReportText(const StatusReport &report)
-{
-    std::ostringstream text;
-    text << "indexing: " << report.status;
-    if (report.resumeTime != -1) {
-        const std::string until = PauseText(report.resumeTime);
-        text << (report.status == "paused" ? " " + until : " (paused " + until + ")");
-    }
-    text << "\nfileindexd: " << (report.daemon.reachable ? "running, reachable" : "not reachable: " + report.daemon.problem)
-         << "\n";
-    if (!report.folders.empty()) {
-        Table table({"FOLDER", "STATUS"});
-        for (const fileindex_tool::FolderState &folder : report.folders) {
-            table.Add({TerminalText(folder.path), folder.status});
-        }
-        table.Print(text);
-    }
-    return text.str();
-}
-
-// Redraws until the overall status is "finished" or the user interrupts. On a terminal the
-// previous drawing is replaced; otherwise each change is printed below the last. With --json
-// nothing is drawn: the one document is printed once indexing has finished.
-int Watch(const Context &context, const StatusOptions &options)
-{
-    struct sigaction action = {};
-    action.sa_handler = OnInterrupt;
-    sigaction(SIGINT, &action, nullptr);
-    sigaction(SIGTERM, &action, nullptr);
-    const bool terminal = isatty(STDOUT_FILENO) == 1;
-    std::string drawn;
-    for (;;) {
-        StatusReport report;
-        ClearLastError();
-        if (!fileindex_tool::TakeStatusReport(options.paths, report)) {
-            return Report(context, LibraryFailure("status", kReadHint));
-        }
-        const std::string text = ReportText(report);
-        if (!context.json && text != drawn) {
-            if (terminal && !drawn.empty()) {
-                std::cout << "\033[" << std::count(drawn.begin(), drawn.end(), '\n') << "A\033[J";
-            } else if (!drawn.empty()) {
-                std::cout << "\n";
-            }
-            std::cout << text << std::flush;
-            drawn = text;
-        }
-        if (report.status == "finished") {
-            if (context.json) {
-                PrintJson(fileindex_tool::StatusRecord(report));
-            }
-            return kSuccess;
-        }
-        for (double waited = 0; waited < options.interval; waited += 0.05) {
-            if (g_interrupted) {
-                return kInterrupted;
-            }
-            usleep(50000);
-        }
-    }
-}
 
 int Status(const Context &context, StatusOptions &options)
 {
@@ -133,7 +53,7 @@ int Status(const Context &context, StatusOptions &options)
         }
     }
     if (options.watch) {
-        return Watch(context, options);
+        return Watch(context, options.paths, options.interval);
     }
     StatusReport report;
     ClearLastError();
@@ -143,7 +63,11 @@ int Status(const Context &context, StatusOptions &options)
     if (context.json) {
         PrintJson(fileindex_tool::StatusRecord(report));
     } else {
-        std::cout << ReportText(report);
+        for (const std::vector<std::string> &lines : {SummaryLines(report), FolderLines(report)}) {
+            for (const std::string &line : lines) {
+                std::cout << line << "\n";
+            }
+        }
     }
     return kSuccess;
 }
@@ -199,9 +123,18 @@ void AddStatusCommands(CLI::App &app, Context &context)
     AddPaths(*statusCommand, context, status->paths, "folders to show (default: every indexed folder)");
     statusCommand->add_flag("--watch", status->watch,
                             "redraw until indexing has finished or Ctrl-C; with --json, print the finished state");
-    statusCommand->add_option("--interval", status->interval, "seconds between redraws")
+    statusCommand->add_option("--interval", status->interval, "seconds between redraws, from 0.05 to 3600")
         ->capture_default_str()
-        ->check(CLI::PositiveNumber);
+        ->type_name("SECONDS")
+        ->check(CLI::Validator(
+            [](std::string &text) {
+                char *end = nullptr;
+                const double seconds = strtod(text.c_str(), &end);
+                return !text.empty() && *end == '\0' && seconds >= 0.05 && seconds <= 3600
+                           ? std::string()
+                           : "'" + text + "' is not a number of seconds from 0.05 to 3600";
+            },
+            "SECONDS"));
 
     auto hours = std::make_shared<long long>(0);
     CLI::App *pause = AddCommand(app, context, "pause", "pause indexing and tell fileindexd",
