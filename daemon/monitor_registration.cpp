@@ -33,7 +33,8 @@ bool IndexMgr::UpsertVNotifydCfg(const std::string &share)
         return false;
     }
     std::vector<Folder> shareFolders;
-    if (!LoadFolderList(shareFolders, share)) {
+    ShareLookups asked(Reuse::kAskEveryTime);
+    if (!LoadFolderList(shareFolders, share, asked)) {
         return false;
     }
 

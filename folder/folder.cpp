@@ -6,6 +6,8 @@
 #include "fileindex/error.h"
 #include "fileindex/status.h"
 #include "fileindex/utils.h"
+#include "folder/listing.h"
+#include "share/share_lookup.h"
 
 FILEIDX_LOG_UNIT("folder.cpp");
 
@@ -68,21 +70,39 @@ Json::Value Folder::asJson() const
 
 Json::Value Folder::asJson(const Json::Value &additional) const
 {
-    Json::Value record = asJson();
-    if (!GetAdditional(record["additional"], additional)) {
+    CallContext asked(Reuse::kAskEveryTime);
+    return RecordWithAdditional(*this, additional, asked);
+}
+
+bool Folder::GetAdditional(Json::Value &out, const std::string &key) const
+{
+    CallContext asked(Reuse::kAskEveryTime);
+    return FILEINDEX::GetAdditional(*this, out, key, asked);
+}
+
+bool Folder::GetAdditional(Json::Value &out, const Json::Value &keys) const
+{
+    CallContext asked(Reuse::kAskEveryTime);
+    return FILEINDEX::GetAdditional(*this, out, keys, asked);
+}
+
+Json::Value RecordWithAdditional(const Folder &folder, const Json::Value &additional, CallContext &context)
+{
+    Json::Value record = folder.asJson();
+    if (!GetAdditional(folder, record["additional"], additional, context)) {
         FILEIDX_LOG("%s:%d GetAdditional failed");
     }
     return record;
 }
 
-bool Folder::GetAdditional(Json::Value &out, const std::string &key) const
+bool GetAdditional(const Folder &folder, Json::Value &out, const std::string &key, CallContext &context)
 {
     if (key == "status") {
-        out = StatusMgr::GetFolderStatus(m_path);
+        out = GetFolderStatus(folder.m_path, context);
         return true;
     }
     if (key == "is_valid") {
-        out = CanPathBeIndexed(m_path);
+        out = GetPathIndexRefusal(folder.m_path, context.shares) == IndexRefusal::kNone;
         return true;
     }
     FILEIDX_LOG("%s:%d Unknown additional: %s", key.c_str());
@@ -90,7 +110,7 @@ bool Folder::GetAdditional(Json::Value &out, const std::string &key) const
     return false;
 }
 
-bool Folder::GetAdditional(Json::Value &out, const Json::Value &keys) const
+bool GetAdditional(const Folder &folder, Json::Value &out, const Json::Value &keys, CallContext &context)
 {
     out = Json::Value(Json::objectValue);
     if (!keys.isArray()) {
@@ -106,7 +126,7 @@ bool Folder::GetAdditional(Json::Value &out, const Json::Value &keys) const
         }
         // An unknown key stays in out as null and does not fail the list.
         const std::string name = key.asString();
-        if (!GetAdditional(out[name], name)) {
+        if (!GetAdditional(folder, out[name], name, context)) {
             FILEIDX_LOG("%s:%d Failed to get additional: %s", name.c_str());
         }
     }

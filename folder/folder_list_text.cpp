@@ -106,7 +106,7 @@ private:
 
 }  // namespace
 
-bool ReadFolderListText(const std::string &text, std::vector<Folder> &out)
+bool ReadFolderListText(const std::string &text, std::vector<Folder> &out, ShareLookups &lookups)
 {
     FolderMembers members;
     if (!ScanJsonText(text.data(), text.size(), members) || !members.Usable()) {
@@ -121,12 +121,12 @@ bool ReadFolderListText(const std::string &text, std::vector<Folder> &out)
         folder.m_bAudio = entry.audio.value_or(false);
         folder.m_bVideo = entry.video.value_or(false);
         folder.m_bPhoto = entry.photo.value_or(false);
-        GetFullPath(folder.m_fullPath, folder.m_path);
+        GetFullPath(folder.m_fullPath, folder.m_path, lookups);
     }
     return true;
 }
 
-bool LoadFolderList(std::vector<Folder> &out, const std::string &share)
+bool LoadFolderList(std::vector<Folder> &out, const std::string &share, ShareLookups &lookups)
 {
     Folders folders;
     const std::string path = folders.GetPath();
@@ -136,7 +136,7 @@ bool LoadFolderList(std::vector<Folder> &out, const std::string &share)
     }
     std::string text;
     std::vector<Folder> all;
-    if (!ReadWholeFile(path, text) || !ReadFolderListText(text, all)) {
+    if (!ReadWholeFile(path, text) || !ReadFolderListText(text, all, lookups)) {
         return folders.Load() && folders.List(out, share);
     }
     out.clear();

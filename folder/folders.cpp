@@ -13,7 +13,7 @@
 #include "folder/change_report.h"
 #include "folder/folder_list_text.h"
 #include "platform/unicode.h"
-#include "status/folder_events.h"
+#include "folder/listing.h"
 
 FILEIDX_LOG_UNIT("folders.cpp");
 
@@ -184,32 +184,41 @@ bool Folders::List(std::vector<Folder> &out, const std::string &share)
 bool Folders::List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
                    const std::string &sort_direction, const Json::Value &additional)
 {
-    std::vector<Folder> sorted;
-    List(sorted);
+    std::vector<Folder> folders;
+    List(folders);
+    CallContext context(Reuse::kOncePerCall);
+    ListPage(std::move(folders), out, offset, limit, sort_by, sort_direction, additional, context);
+    return true;
+}
+
+void ListPage(std::vector<Folder> folders, Json::Value &out, unsigned long offset, unsigned long limit,
+              const std::string &sort_by, const std::string &sort_direction, const Json::Value &additional,
+              CallContext &context)
+{
     out = Json::Value(Json::objectValue);
-    out["total"] = Json::UInt64(sorted.size());
+    out["total"] = Json::UInt64(folders.size());
     out["offset"] = Json::UInt64(offset);
     // Stable, so that folders the key does not tell apart stay in path order. A stable merge also
     // never strays outside the vector when the platform's comparison is not a strict order (texts
     // mixing valid and invalid UTF-8).
-    std::stable_sort(sorted.begin(), sorted.end(), CompareFolder(sort_by));
+    std::stable_sort(folders.begin(), folders.end(), CompareFolder(sort_by));
 
-    const unsigned long count = offset >= sorted.size() ? 0 : std::min<unsigned long>(sorted.size() - offset, limit);
+    const unsigned long count = offset >= folders.size() ? 0 : std::min<unsigned long>(folders.size() - offset, limit);
     // A descending page is the first count folders of the ascending order, reversed: the offset is
     // not applied.
     const bool descending = sort_direction == "DESC";
-    const auto first = sorted.begin() + static_cast<long>(descending || count == 0 ? 0 : offset);
+    const auto first = folders.begin() + static_cast<long>(descending || count == 0 ? 0 : offset);
     std::vector<std::string> fullPaths;
     std::transform(first, first + static_cast<long>(count), std::back_inserter(fullPaths),
                    [](const Folder &folder) { return folder.m_fullPath; });
     // Each folder's "status" searches its share's queue files: one reading of each serves the page.
-    const OneQueueReadingPerCall queueReading(std::move(fullPaths));
+    context.queues.ReadOnceFor(std::move(fullPaths));
     Json::Value page(Json::arrayValue);
     for (unsigned long i = 0; i < count; ++i) {
-        page.append(first[static_cast<long>(descending ? count - 1 - i : i)].asJson(additional));
+        const Folder &folder = first[static_cast<long>(descending ? count - 1 - i : i)];
+        page.append(RecordWithAdditional(folder, additional, context));
     }
     out["folder"] = page;
-    return true;
 }
 
 }  // namespace FILEINDEX

@@ -3,6 +3,7 @@
 
 #include "config/unlock_on_return.h"
 #include "folder/folder_list_text.h"
+#include "folder/listing.h"
 #include "share/share_lookup.h"
 
 namespace VEXO {
@@ -10,15 +11,22 @@ namespace FILEINDEX {
 
 bool IndexMgr::List(std::vector<Folder> &out)
 {
-    const OneShareLookupPerCall shareLookups;
-    return LoadFolderList(out, std::string());
+    ShareLookups lookups(Reuse::kOncePerCall);
+    return LoadFolderList(out, std::string(), lookups);
 }
 
+// Loads folder.conf as Folders::Load does, then lists as Folders::List does; one context serves
+// both, so that each share is looked up once for the whole call.
 bool IndexMgr::List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
                     const std::string &sort_direction, const Json::Value &additional)
 {
-    Folders folders;
-    return folders.Load() && folders.List(out, offset, limit, sort_by, sort_direction, additional);
+    CallContext context(Reuse::kOncePerCall);
+    std::vector<Folder> folders;
+    if (!LoadFolderList(folders, std::string(), context.shares)) {
+        return false;
+    }
+    ListPage(std::move(folders), out, offset, limit, sort_by, sort_direction, additional, context);
+    return true;
 }
 
 bool IndexMgr::Get(Json::Value &out, const std::string &path)

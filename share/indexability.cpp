@@ -9,6 +9,7 @@
 #include "fileindex/utils.h"
 #include "platform/fs.h"
 #include "platform/share_db.h"
+#include "share/share_lookup.h"
 #include "share/storage_paths.h"
 
 FILEIDX_LOG_UNIT("utils.cpp");
@@ -32,8 +33,6 @@ const std::vector<std::string> kPreservedFileNames = {
 };
 // Shares that are never indexed (exact, case-sensitive names).
 const std::vector<std::string> kExcludedShareNames = {"surveillance", "NetBackup"};
-
-using ShareRecord = std::unique_ptr<VEXOSHARE, decltype(&VEXOShareFree)>;
 
 bool Contains(const std::string &text, const char *part)
 {
@@ -68,14 +67,19 @@ IndexRefusal GetFsTypeRefusal(int fsType)
 }
 
 // A mount point may be indexed only inside a share that uses encryption (or whose encryption
-// cannot be told); elsewhere it is another volume grafted into the share.
-bool IsMountPointAllowed(const std::string &fullPath, VEXOSHARE *share)
+// cannot be told); elsewhere it is another volume grafted into the share. Whether the share uses
+// encryption is asked once per share facts.
+bool IsMountPointAllowed(const std::string &fullPath, ShareFacts &share)
 {
     if (VEXOFSDirIsMntPoint(fullPath.c_str()) != 1) {
         return true;
     }
-    int usesEncryption = 0;
-    if (VLIBShareIsEncryptionGet(share, &usesEncryption) == 0 && usesEncryption == 0) {
+    if (share.mountPointAllowed < 0) {
+        int usesEncryption = 0;
+        const bool unencrypted = VLIBShareIsEncryptionGet(share.record, &usesEncryption) == 0 && usesEncryption == 0;
+        share.mountPointAllowed = unencrypted ? 0 : 1;
+    }
+    if (share.mountPointAllowed == 0) {
         FILEIDX_LOG("%s:%d Mount point[%s] is not allowed to be indexed", fullPath.c_str());
         return false;
     }
@@ -136,6 +140,14 @@ bool CanShareBeIndexed(_tag_VEXOSHARE *share)
 
 IndexRefusal GetFullPathIndexRefusal(const std::string &fullPath)
 {
+    ShareLookups asked(Reuse::kAskEveryTime);
+    return GetFullPathIndexRefusal(fullPath, asked);
+}
+
+// The folder's own path is judged at every call; the share's record and its share-wide rule may be
+// the ones lookups got for an earlier folder of the share.
+IndexRefusal GetFullPathIndexRefusal(const std::string &fullPath, ShareLookups &lookups)
+{
     if (IsInRecycleBin(fullPath)) {
         return IndexRefusal::kRecycleBin;
     }
@@ -156,17 +168,16 @@ IndexRefusal GetFullPathIndexRefusal(const std::string &fullPath)
         FILEIDX_LOG("%s:%d GetShareNamePathByFullPath failed, path=%s", fullPath.c_str());
         return IndexRefusal::kNoShare;
     }
-    PVEXOSHARE record = nullptr;
-    if (VEXOShareGet(shareName.c_str(), &record) < 0) {
+    // Held until the end, so that a record of its own is released after the last test, as always.
+    const std::shared_ptr<ShareFacts> share = lookups.FindShareFacts(shareName);
+    if (share == nullptr) {
         FILEIDX_LOG("%s:%d VEXOShareGet failed, share=%s", shareName.c_str());
         return IndexRefusal::kShareLookupFailed;
     }
-    const ShareRecord share(record, &VEXOShareFree);
-    const IndexRefusal shareRefusal = GetShareIndexRefusal(share.get());
-    if (shareRefusal != IndexRefusal::kNone) {
-        return shareRefusal;
+    if (share->refusal != IndexRefusal::kNone) {
+        return share->refusal;
     }
-    if (!IsMountPointAllowed(fullPath, share.get())) {
+    if (!IsMountPointAllowed(fullPath, *share)) {
         return IndexRefusal::kMountPoint;
     }
     return IsCanonical(fullPath) ? IndexRefusal::kNone : IndexRefusal::kNotCanonical;
@@ -179,13 +190,19 @@ bool CanFullPathBeIndexed(const std::string &fullPath)
 
 IndexRefusal GetPathIndexRefusal(const std::string &path)
 {
+    ShareLookups asked(Reuse::kAskEveryTime);
+    return GetPathIndexRefusal(path, asked);
+}
+
+IndexRefusal GetPathIndexRefusal(const std::string &path, ShareLookups &lookups)
+{
     std::string fullPath;
-    if (!GetFullPath(fullPath, path)) {
+    if (!GetFullPath(fullPath, path, lookups)) {
         FILEIDX_LOG("%s:%d GetFullPath failed, path=%s", path.c_str());
         ErrorHandler::SetError(FILEIDX_ERR_PATH);
         return IndexRefusal::kPathUnresolved;
     }
-    return GetFullPathIndexRefusal(fullPath);
+    return GetFullPathIndexRefusal(fullPath, lookups);
 }
 
 bool CanPathBeIndexed(const std::string &path)

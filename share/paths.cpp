@@ -1,6 +1,6 @@
 // Share and path resolution: share names cut from share-relative paths, full paths through the
-// share database (looked up once per share while a OneShareLookupPerCall lives), the share of a
-// full path, share renames in a path, and the file tests.
+// share database (each share's path taken from a call's ShareLookups), the share of a full path,
+// share renames in a path, and the file tests.
 #include <sys/stat.h>
 
 #include "config/log.h"
@@ -26,59 +26,25 @@ bool GetShareNameByPath(std::string &share, const std::string &path)
 
 bool GetFullPath(std::string &fullPath, const std::string &path)
 {
+    ShareLookups asked(Reuse::kAskEveryTime);
+    return GetFullPath(fullPath, path, asked);
+}
+
+bool GetFullPath(std::string &fullPath, const std::string &path, ShareLookups &lookups)
+{
     std::string share;
     if (!GetShareNameByPath(share, path)) {
         FILEIDX_LOG("%s:%d GetShareNameByPath failed, path=%s", path.c_str());
         return false;
     }
     std::string sharePath;
-    if (!OneShareLookupPerCall::Find(share, sharePath)) {
-        PVEXOSHARE record = nullptr;
-        if (VEXOShareGet(share.c_str(), &record) < 0) {
-            ErrorHandler::SetError(FILEIDX_ERR_PATH);
-            return false;
-        }
-        sharePath = record->szPath;
-        VEXOShareFree(record);
-        OneShareLookupPerCall::Keep(share, sharePath);
+    if (!lookups.FindSharePath(share, sharePath)) {
+        ErrorHandler::SetError(FILEIDX_ERR_PATH);
+        return false;
     }
     const size_t lastSlash = sharePath.rfind('/');
     fullPath = (lastSlash == std::string::npos ? sharePath : sharePath.substr(0, lastSlash)) + path;
     return true;
-}
-
-namespace {
-thread_local OneShareLookupPerCall *t_shareLookups = nullptr;
-}  // namespace
-
-OneShareLookupPerCall::OneShareLookupPerCall() : m_outer(t_shareLookups)
-{
-    t_shareLookups = this;
-}
-
-OneShareLookupPerCall::~OneShareLookupPerCall()
-{
-    t_shareLookups = m_outer;
-}
-
-bool OneShareLookupPerCall::Find(const std::string &share, std::string &sharePath)
-{
-    if (t_shareLookups == nullptr) {
-        return false;
-    }
-    const auto found = t_shareLookups->m_sharePaths.find(share);
-    if (found == t_shareLookups->m_sharePaths.end()) {
-        return false;
-    }
-    sharePath = found->second;
-    return true;
-}
-
-void OneShareLookupPerCall::Keep(const std::string &share, const std::string &sharePath)
-{
-    if (t_shareLookups != nullptr) {
-        t_shareLookups->m_sharePaths.emplace(share, sharePath);
-    }
 }
 
 bool FindShareOfFullPath(std::string &share, std::string &sharePath, const std::string &fullPath)

@@ -10,6 +10,7 @@
 
 #include "config/file_io.h"
 #include "daemon/queue_record.h"
+#include "fileindex/utils.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -18,8 +19,6 @@ namespace {
 
 constexpr size_t kNoEvent = static_cast<size_t>(-1);
 constexpr size_t kMaxKeptMalformedBytes = 1024 * 1024;
-
-thread_local OneQueueReadingPerCall::Readings *t_readings = nullptr;
 
 // The last eight bytes (or fewer) of [text, text + length), with the length mixed in.
 uint64_t Tail(const char *text, size_t length)
@@ -82,14 +81,14 @@ bool IsInside(const std::string &path, std::string_view folder)
 
 }  // namespace
 
-// What one reading of a queue file found for the folders of a OneQueueReadingPerCall.
+// What one reading of a queue file found for the folders of a QueueReadings.
 struct FileReading {
     bool usable = false;
     std::vector<size_t> firstEvent;                          // per folder: the line of its first event
     std::vector<std::pair<size_t, std::string>> malformed;  // line and text, in file order
 };
 
-class OneQueueReadingPerCall::Readings {
+class QueueReadings::Readings {
 public:
     explicit Readings(std::vector<std::string> folders) : m_folders(std::move(folders)) {}
 
@@ -202,9 +201,6 @@ private:
 bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
                        const std::function<void(std::string_view line)> &malformed, bool &found)
 {
-    if (t_readings != nullptr && t_readings->Answer(queueFile, folder, malformed, found)) {
-        return true;
-    }
     found = false;
     QueueRecord record;
     return ForEachLine(queueFile, [&](std::string_view line) {
@@ -217,15 +213,32 @@ bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
     });
 }
 
-OneQueueReadingPerCall::OneQueueReadingPerCall(std::vector<std::string> folders)
-    : m_readings(new Readings(std::move(folders))), m_outer(t_readings)
+QueueReadings::QueueReadings(Reuse reuse) : m_reuse(reuse) {}
+
+void QueueReadings::ReadOnceFor(std::vector<std::string> folders)
 {
-    t_readings = m_readings.get();
+    m_readings.reset(new Readings(std::move(folders)));
 }
 
-OneQueueReadingPerCall::~OneQueueReadingPerCall()
+QueueReadings::~QueueReadings() = default;
+
+bool QueueReadings::Exists(const std::string &queueFile)
 {
-    t_readings = m_outer;
+    if (m_reuse == Reuse::kAskEveryTime) {
+        return IsFileExist(queueFile);
+    }
+    const auto kept = m_exists.find(queueFile);
+    return kept != m_exists.end() ? kept->second : m_exists.emplace(queueFile, IsFileExist(queueFile)).first->second;
+}
+
+bool QueueReadings::FindEventInFolder(const std::string &queueFile, const std::string &folder,
+                                      const std::function<void(std::string_view line)> &malformed, bool &found)
+{
+    const bool kept = m_reuse == Reuse::kOncePerCall && m_readings != nullptr;
+    if (kept && m_readings->Answer(queueFile, folder, malformed, found)) {
+        return true;
+    }
+    return FILEINDEX::FindEventInFolder(queueFile, folder, malformed, found);
 }
 
 }  // namespace FILEINDEX

@@ -4,10 +4,13 @@
 #define FILEINDEX_STATUS_FOLDER_EVENTS_H
 
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
+
+#include "share/share_lookup.h"
 
 namespace VEXO {
 namespace FILEINDEX {
@@ -20,24 +23,34 @@ namespace FILEINDEX {
 bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
                        const std::function<void(std::string_view line)> &malformed, bool &found);
 
-// While an object of this class lives, FindEventInFolder on the same thread answers for the folders
-// given to it from one reading of each queue file, made when the first of them asks about that
-// file: all of them see the file as that reading found it, and the answers are the ones their own
-// searches of that content would give, malformed lines included. Any other folder, a file that
-// cannot be read, and a file with more malformed text than is worth keeping (1 MiB) are searched as
-// without it. Nothing outlives the object.
-class OneQueueReadingPerCall {
+// What one call has read of queue files. With Reuse::kOncePerCall, once told the full paths of the
+// folders the call will ask about, each queue file is read once, when the first of them asks about
+// it, and each of them is answered from that reading: all see the file as the reading found it, and
+// the answers are the ones their own searches of that content would give, malformed lines included.
+// A file's existence is likewise looked at once. Any other folder, a file that cannot be read, a
+// file with more malformed text than is worth keeping (1 MiB), and every question with
+// kAskEveryTime are searched afresh.
+class QueueReadings {
 public:
-    explicit OneQueueReadingPerCall(std::vector<std::string> folders);
-    ~OneQueueReadingPerCall();
-    OneQueueReadingPerCall(const OneQueueReadingPerCall &) = delete;
-    OneQueueReadingPerCall &operator=(const OneQueueReadingPerCall &) = delete;
+    explicit QueueReadings(Reuse reuse);
+    ~QueueReadings();
+    QueueReadings(const QueueReadings &) = delete;
+    QueueReadings &operator=(const QueueReadings &) = delete;
+
+    // The full paths of the folders whose events the call will look for, before the first question.
+    void ReadOnceFor(std::vector<std::string> folders);
+    // IsFileExist(queueFile).
+    bool Exists(const std::string &queueFile);
+    // FindEventInFolder(queueFile, folder, malformed, found).
+    bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
+                           const std::function<void(std::string_view line)> &malformed, bool &found);
 
     class Readings;
 
 private:
+    const Reuse m_reuse;
     std::unique_ptr<Readings> m_readings;
-    Readings *m_outer;
+    std::map<std::string, bool> m_exists;
 };
 
 }  // namespace FILEINDEX

@@ -12,6 +12,7 @@
 #include "fileindex/utils.h"
 #include "share/share_lookup.h"
 #include "share/storage_paths.h"
+#include "status/call_context.h"
 #include "status/folder_events.h"
 
 FILEIDX_LOG_UNIT("status_mgr.cpp");
@@ -68,9 +69,9 @@ const char *PendingWord(long long resumeTime)
 }
 
 // The share's event queue file; false, logged, when the share is unknown.
-bool QueuePathOfShare(std::string &queue, const std::string &share)
+bool QueuePathOfShare(std::string &queue, const std::string &share, ShareLookups &lookups)
 {
-    if (!GetQueuePath(queue, share)) {
+    if (!lookups.FindQueuePath(share, queue)) {
         FILEIDX_LOG("%s:%d FILEIDXQueuePathGet failed, share=%s", share.c_str());
         return false;
     }
@@ -79,18 +80,18 @@ bool QueuePathOfShare(std::string &queue, const std::string &share)
 
 // True when the queue file holds an event on the folder or inside it (for a move, on either side).
 // A line that is not a queue record, a record being appended among them, is logged and passed over.
-bool HasPendingEventForFolder(const std::string &path, const std::string &queueFile)
+bool HasPendingEventForFolder(const std::string &path, const std::string &queueFile, CallContext &context)
 {
-    if (!IsFileExist(queueFile)) {
+    if (!context.queues.Exists(queueFile)) {
         return false;
     }
     std::string fullPath;
-    if (!GetFullPath(fullPath, path)) {
+    if (!GetFullPath(fullPath, path, context.shares)) {
         FILEIDX_LOG("%s:%d Cannot get full path: %s", path.c_str());
         return false;
     }
     bool found = false;
-    const bool read = FindEventInFolder(queueFile, fullPath, [](std::string_view line) {
+    const bool read = context.queues.FindEventInFolder(queueFile, fullPath, [](std::string_view line) {
         FILEIDX_LOG("%s:%d Malformed command: %s", std::string(line).c_str());
     }, found);
     if (!read) {
@@ -179,9 +180,10 @@ bool StatusMgr::GetStatus(std::string &status)
         }
     }
     bool pending = false;
+    ShareLookups asked(Reuse::kAskEveryTime);
     for (const std::string &share : shares) {
         std::string queue;
-        if (!QueuePathOfShare(queue, share)) {
+        if (!QueuePathOfShare(queue, share, asked)) {
             return false;
         }
         if (IsFileExist(queue) || IsFileExist(QueueCompanionPath(queue))) {
@@ -203,7 +205,13 @@ bool StatusMgr::GetStatus(std::string &status)
 
 std::string StatusMgr::GetFolderStatus(const std::string &path)
 {
-    if (!CanPathBeIndexed(path)) {
+    CallContext asked(Reuse::kAskEveryTime);
+    return FILEINDEX::GetFolderStatus(path, asked);
+}
+
+std::string GetFolderStatus(const std::string &path, CallContext &context)
+{
+    if (GetPathIndexRefusal(path, context.shares) != IndexRefusal::kNone) {
         return kPaused;  // a folder that may not be indexed shows as paused, on purpose
     }
     std::string share;
@@ -211,16 +219,17 @@ std::string StatusMgr::GetFolderStatus(const std::string &path)
         FILEIDX_LOG("%s:%d Failed to get share name from path: %s", path.c_str());
         return kFinished;
     }
-    if (ShareIsNoSpace(share)) {
+    if (context.ShareIsNoSpace(share)) {
         return kNoSpace;
     }
     std::string queue;
-    if (!QueuePathOfShare(queue, share)) {
+    if (!QueuePathOfShare(queue, share, context.shares)) {
         return kFinished;
     }
     long long resumeTime = -1;  // stays "running" when the pause state cannot be read
-    GetPauseInfo(resumeTime);
-    if (HasPendingEventForFolder(path, queue) || HasPendingEventForFolder(path, QueueCompanionPath(queue))) {
+    context.GetPauseInfo(resumeTime);
+    if (HasPendingEventForFolder(path, queue, context) ||
+        HasPendingEventForFolder(path, QueueCompanionPath(queue), context)) {
         return PendingWord(resumeTime);
     }
     return kFinished;

@@ -1,13 +1,16 @@
 // Queue files read fast: every line judged as the JSON library judges it, lines found whole across
-// the reader's blocks, and a listing that reads each queue once reporting exactly what each folder's
-// own search reports, malformed lines included.
+// the reader's blocks, and a listing that reads each share, queue and status.conf once reporting
+// exactly what each folder's own calls report, malformed lines included.
 #include <cstdio>
+#include <set>
 
 #include "config/json_io.h"
 #include "daemon/event_queue.h"
 #include "daemon/queue_record.h"
 #include "fileindex/index_mgr.h"
+#include "fileindex/error.h"
 #include "fileindex/status.h"
+#include "fileindex/utils.h"
 #include "share/storage_paths.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/sandbox.h"
@@ -125,13 +128,25 @@ TEST_F(QueueScanTest, LongQueueIsJudgedLineByLine)
     }
 }
 
-// The listing reads each queue file once for all its folders; each folder's status and the lines
-// logged for it must be what asking for that folder alone gives, in the listing's order.
-TEST_F(QueueScanTest, ListingReportsEachFolderAsItsOwnSearchWould)
+// The listing asks about each share, reads each queue file and status.conf once for its whole page;
+// each folder's "status" and "is_valid", the lines logged for it (in the listing's order) and the
+// error code left must still be what asking for that folder alone gives, whatever the shares, the
+// queues and the status file hold.
+TEST_F(QueueScanTest, ListingAnswersForEachFolderWhatItsOwnCallsAnswer)
 {
-    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/a":{},"/photo/b":{},"/photo/c":{},"/photo/d":{},"/photo/e":{}})");
-    const std::string companion = QueueCompanionPath(m_queue);
-    WriteFile(companion, "not json\n" + Event("/c/x"));
+    DeclareShares("volume1/photo volume1/music volume1/ro+read_only");
+    for (const char *folder : {"/music/m", "/ro/r", "/photo/mnt"}) {
+        stdfs::create_directories(HostPath("/volume1" + std::string(folder)));
+    }
+    stdfs::create_directories(MetadataDirPath(SharePath("music")));
+    WriteFile(StoragePath(SharePath("music"), kQueueFileName),
+              "{\n{\"event\":1,\"path\":\"" + SharePath("music") + "/m/x\"}\n");
+    WriteFile(QueueCompanionPath(m_queue), "not json\n" + Event("/c/x"));
+    SetFaults(ParseJson(R"({"VEXOFSDirIsMntPoint": {"match": ")" + SharePath("photo") + R"(/mnt", "result": 1}})"));
+    // b has events, e and /gone have no directory, /gone no share, /ro a read-only share.
+    WriteFile(FILEINDEX_FOLDER_CONF_PATH, R"({"/photo/a":{},"/photo/b":{},"/photo/c":{},"/photo/d":{},"/photo/e":{},
+        "/photo/mnt":{},"/photo/#recycle/x":{},"/photo/#snapshot/GMT+00-2024/y":{},"/music/m":{},"/ro/r":{},
+        "/gone/x":{}})");
     const std::string manyMalformed = [] {
         std::string lines;
         while (lines.size() <= 1024 * 1024) {
@@ -139,35 +154,48 @@ TEST_F(QueueScanTest, ListingReportsEachFolderAsItsOwnSearchWould)
         }
         return lines;
     }();
-    const std::string queues[] = {
-        "[1]\n" + Event("/b/x") + "{\"event\":1,\n" + Event("/a/y", 256) + Event("/d", 65536) + "{}\n",
-        Event("/e/z") + "{\"event\":\n",  // the file replaced between two listings
-        manyMalformed + Event("/a/x") + "{\n",
+    const struct {
+        const char *status;  // status.conf, null for none
+        std::string queue;   // photo's queue, replaced between two listings
+    } cases[] = {
+        {nullptr, "[1]\n" + Event("/b/x") + "{\"event\":1,\n" + Event("/a/y", 256) + Event("/d", 65536) + "{}\n"},
+        {R"({"resume_time":0})", Event("/e/z") + "{\"event\":\n"},
+        {R"({"no_space":{"music":true},"resume_time":"abc"})", manyMalformed + Event("/a/x") + "{\n"},
+        {"[]", Event("/b")},
     };
-    Json::Value additional(Json::arrayValue);
-    additional.append("status");
-    for (const std::string &content : queues) {
+    std::set<std::string> words;
+    for (const auto &c : cases) {
+        SCOPED_TRACE(c.status == nullptr ? "no status.conf" : c.status);
+        stdfs::remove(FILEINDEX_STATUS_CONF_PATH);
+        if (c.status != nullptr) {
+            WriteFile(FILEINDEX_STATUS_CONF_PATH, c.status);
+        }
         const std::string replacement = m_queue + ".new";
-        WriteFile(replacement, content);
+        WriteFile(replacement, c.queue);
         ASSERT_EQ(rename(replacement.c_str(), m_queue.c_str()), 0);
-        std::vector<std::string> words;
-        std::vector<std::string> messages;
-        for (const char *folder : {"/photo/a", "/photo/b", "/photo/c", "/photo/d", "/photo/e"}) {
-            LogCapture::Clear();
-            words.push_back(StatusMgr::GetFolderStatus(folder));
-            const std::vector<std::string> own = LogCapture::Messages();
-            messages.insert(messages.end(), own.begin(), own.end());
-        }
+
         LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
         Json::Value page;
-        ASSERT_TRUE(IndexMgr::List(page, 0, 10, "path", "", additional));
-        ASSERT_EQ(page["folder"].size(), words.size());
-        for (Json::ArrayIndex i = 0; i < page["folder"].size(); ++i) {
-            EXPECT_EQ(page["folder"][i]["additional"]["status"].asString(), words[i]) << i << " " << content.size();
+        ASSERT_TRUE(IndexMgr::List(page, 0, 20, "path", "", ParseJson(R"(["status", "is_valid"])")));
+        const std::vector<std::string> listed = LogCapture::Messages();
+        const _tag_fileindex_err_ listedError = ErrorHandler::GetError();
+
+        LogCapture::Clear();
+        ErrorHandler::SetError(FILEIDX_ERR_NONE);
+        ASSERT_EQ(page["folder"].size(), 11u);
+        for (const Json::Value &record : page["folder"]) {
+            const std::string path = record["path"].asString();
+            const std::string word = StatusMgr::GetFolderStatus(path);
+            EXPECT_EQ(record["additional"], ParseJson(R"({"status": ")" + word + R"(", "is_valid": )" +
+                                                      (CanPathBeIndexed(path) ? "true}" : "false}")))
+                << path;
+            words.insert(word);
         }
-        EXPECT_EQ(LogCapture::Messages(), messages) << content.size();
-        EXPECT_GT(messages.size(), 1u) << "each queue holds malformed lines";
+        EXPECT_EQ(listed, LogCapture::Messages());
+        EXPECT_EQ(listedError, ErrorHandler::GetError());
     }
+    EXPECT_EQ(words, (std::set<std::string>{"finished", "processing", "paused", "err_no_space"}));
 }
 
 }  // namespace

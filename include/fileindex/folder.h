@@ -109,7 +109,10 @@ public:
     // key does not tell apart stay in path order. The page holds the folders from offset on, at
     // most limit of them (0 gives none, an offset at or past the end gives none). With
     // sort_direction exactly "DESC" the page is instead the first min(total - offset, limit)
-    // folders of the ascending order, reversed: the offset only shortens it. Always true.
+    // folders of the ascending order, reversed: the offset only shortens it. The records' "status"
+    // and "is_valid" are those of asJson, with each share's facts, each queue file and status.conf
+    // read once for the whole page: the same answers, log lines and error codes on a quiet
+    // appliance, fewer platform calls. Always true.
     bool List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
               const std::string &sort_direction, const Json::Value &additional);
 

@@ -23,7 +23,9 @@ public:
     static bool List(std::vector<Folder> &out);
     // A sorted page of the folder list with computed information, as Folders::List of the same form
     // (see folder.h), read without the folder lock. False, out untouched, with error 6 or 8 when
-    // folder.conf is unreadable. "status" costs one progress query per folder on the page.
+    // folder.conf is unreadable. Each share is looked up once per call; "status" and "is_valid" are
+    // each folder's own answers (StatusMgr::GetFolderStatus, CanPathBeIndexed) with each share's
+    // facts, each queue file and status.conf read once for the whole page.
     static bool List(Json::Value &out, unsigned long offset, unsigned long limit, const std::string &sort_by,
                      const std::string &sort_direction, const Json::Value &additional);
     // One folder's record, read under the folder lock (the one reader that locks). Failures: error 9
