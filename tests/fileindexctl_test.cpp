@@ -30,14 +30,15 @@ struct Outcome {
     std::string err;
 };
 
-// How a run sees the world besides its arguments: its standard output on a terminal (a
-// pseudo-terminal of rows lines with TERM=term) or a file, and whether it is interrupted (SIGINT)
-// after a while.
+// How a run sees the world besides its arguments: its standard input and output on a terminal (a
+// pseudo-terminal of rows lines with TERM=term, where input is typed) or a file and nothing, and
+// whether it is interrupted (SIGINT) after a while.
 struct Setting {
     bool terminal = false;
     std::string term;
     unsigned short rows = 24;
     int interruptAfterMilliseconds = -1;
+    std::string input;
 };
 
 class FileindexctlTest : public SandboxTest {
@@ -82,9 +83,15 @@ protected:
         posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, setting.terminal ? ptsname(terminal) : out.c_str(),
                                          setting.terminal ? O_RDWR | O_NOCTTY : O_WRONLY | O_CREAT | O_TRUNC, 0644);
         posix_spawn_file_actions_addopen(&files, STDERR_FILENO, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        posix_spawn_file_actions_addopen(&files, STDIN_FILENO, setting.terminal ? ptsname(terminal) : "/dev/null",
+                                         setting.terminal ? O_RDWR | O_NOCTTY : O_RDONLY, 0);
         pid_t pid = -1;
         EXPECT_EQ(posix_spawn(&pid, FILEINDEXCTL, &files, nullptr, argv.data(), envp.data()), 0);
         posix_spawn_file_actions_destroy(&files);
+        if (terminal >= 0) {
+            EXPECT_EQ(write(terminal, setting.input.data(), setting.input.size()),
+                      static_cast<ssize_t>(setting.input.size()));
+        }
         std::string shown;
         const auto readTerminal = [terminal, &shown]() {
             char buffer[4096];
@@ -150,6 +157,7 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         {{"share", "space", "nosuch"}, 4, "share space nosuch: " + noShare + " .*"},
         {{"share", "paths", "nosuch"}, 4, "share paths nosuch: " + noShare + " .*"},
         {{"pause", "--hours", "-1"}, 2, "pause --hours: -1 hours is negative; .*"},
+        {{"folder", "set", "/photo/a"}, 2, "folder set: nothing to change; give --name, or .*"},
         {{"pause", "--hours", "100000"}, 2,
          "pause --hours: a pause of 100000 hours would end after 2038-01-19 03:14:07 UTC, the last time "
          "status.conf can hold; the largest is [0-9]+ hours \\(until 2038-01-19 .*\\), or 0 to pause until resumed"},
@@ -180,12 +188,19 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
     } usages[] = {
         {{"folder", "get"}, "[^\n]*PATH[^\n]*"},
         {{"status", "--watch", "--interval", "0"}, "--interval: '0' is not a number of seconds from 0.05 to 3600"},
+        {{"folder", "list", "--limit", "-1"}, "--limit: '-1' is not a whole number from 0 to 1000000"},
+        {{"foldr", "list"}, "unknown command 'foldr'; did you mean 'folder'\\?"},
+        {{"--wait", "1", "share", "revie", "photo"}, "unknown command 'revie' of 'share'; did you mean 'revive'\\?"},
     };
     for (const Usage &usage : usages) {
         const Outcome outcome = Ctl(usage.args);
         EXPECT_EQ(outcome.status, 2);
         EXPECT_TRUE(std::regex_match(outcome.err, std::regex("fileindexctl: " + usage.line + " \\(see --help\\)\n")))
             << outcome.err;
+        std::vector<std::string> jsonArgs = usage.args;
+        jsonArgs.push_back("--json");
+        EXPECT_TRUE(std::regex_match(ParseJson(Ctl(jsonArgs).out)["error"]["message"].asString(),
+                                     std::regex(usage.line + " \\(see --help\\)")));
     }
     EXPECT_EQ(ParseJson(ReadFile(kFolderConf)).getMemberNames(), std::vector<std::string>{"/photo/a"});
 }
@@ -269,13 +284,13 @@ TEST_F(FileindexctlTest, StatusWatchRedrawsInPlaceOnlyOnATerminal)
         Setting setting;
         std::string shown;  // regular expression for what standard output received, without "\r"
     } rows[] = {
-        {{true, "xterm", 8, 400},
+        {{true, "xterm", 8, 400, ""},
          "\x1b\\[\\?1049h\x1b\\[\\?7l\x1b\\[\\?25l(\x1b\\[H" + std::regex_replace(summary, std::regex("\n"), "\x1b\\[K\n") +
              "FOLDER +STATUS\x1b\\[K\n/photo/f10 +paused\x1b\\[K\n\\.\\.\\. 29 more lines; a taller window shows "
              "them\x1b\\[K\n\x1b\\[J)+"
              "\x1b\\[\\?25h\x1b\\[\\?7h\x1b\\[\\?1049l" + summary + table},
-        {{true, "dumb", 8, 400}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
-        {{false, "xterm", 24, 400}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
+        {{true, "dumb", 8, 400, ""}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
+        {{false, "xterm", 24, 400, ""}, "[0-9:]{8} " + std::regex_replace(summary, std::regex("\n(.)"), "; $1") + summary + table},
     };
     for (const Row &row : rows) {
         SCOPED_TRACE(row.setting.term + (row.setting.terminal ? " terminal" : " file"));
@@ -283,6 +298,51 @@ TEST_F(FileindexctlTest, StatusWatchRedrawsInPlaceOnlyOnATerminal)
         EXPECT_EQ(watched.status, 130);
         const std::string shown = std::regex_replace(watched.out, std::regex("\r"), "");
         EXPECT_TRUE(std::regex_match(shown, std::regex(row.shown))) << shown;
+    }
+}
+
+// The command line as a new user types it: --json anywhere, "changed" for a folder that was there,
+// check's status for a path that may not be indexed, and share clean that asks before it wipes.
+TEST_F(FileindexctlTest, TheCommandLineAsANewUserTypesIt)
+{
+    FrameListener daemon;
+    stdfs::create_directories(SharePath("photo") + "/a");
+    WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"}})");
+    const std::string listed = Ctl({"folder", "list", "--json"}).out;
+    EXPECT_EQ(ParseJson(listed)["total"], 1);
+    EXPECT_EQ(Ctl({"--json", "folder", "list"}).out, listed);
+    EXPECT_EQ(Ctl({"folder", "--json", "list"}).out, listed);
+    EXPECT_EQ(Ctl({"folder", "add", "/photo/a", "--photo"}).out, "changed /photo/a (\"a\", photo)\n");
+
+    const Outcome check = Ctl({"check", "/photo/a", "/photo/#recycle", "--json"});
+    EXPECT_EQ(check.status, 3);
+    EXPECT_EQ(ParseJson(check.out)[1]["refusal"], "recycle_bin");
+    EXPECT_EQ(Ctl({"check", "/photo/a"}).status, 0);
+    EXPECT_EQ(Ctl({"check", "/nosuch/a"}).status, 3);
+
+    const std::string queue = SharePath("photo") + "/@eaDir/VEXO@file_index_queue";
+    const struct Row {
+        Setting setting;
+        std::vector<std::string> extra;
+        int status;
+        bool wiped;
+    } rows[] = {
+        {{}, {}, 2, false},
+        {{true, "xterm", 24, -1, "n\n"}, {}, 1, false},
+        {{true, "xterm", 24, -1, "yes\n"}, {}, 0, true},
+        {{}, {"--yes"}, 0, true},
+    };
+    for (const Row &row : rows) {
+        SCOPED_TRACE(row.setting.input + (row.extra.empty() ? "" : row.extra[0]));
+        stdfs::create_directories(SharePath("photo") + "/@eaDir");
+        WriteFile(queue, "{}\n");
+        std::vector<std::string> args{"share", "clean", "photo"};
+        args.insert(args.end(), row.extra.begin(), row.extra.end());
+        const Outcome clean = Ctl(args, row.setting);
+        EXPECT_EQ(clean.status, row.status) << clean.err;
+        EXPECT_EQ(stdfs::exists(queue), !row.wiped);
+        EXPECT_EQ(clean.err.find("wipe the event queue and index database of share photo? [y/N] ") == 0,
+                  row.setting.terminal);
     }
 }
 

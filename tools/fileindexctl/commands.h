@@ -19,6 +19,7 @@ struct Context {
     bool json = false;               // --json: one JSON document instead of tables
     bool pathBytes = false;          // --path-bytes: path arguments are percent-encoded bytes
     double wait = 5;                 // --wait: seconds to retry while a lock is busy
+    bool yes = false;                // --yes: confirmed beforehand
     std::function<int()> action;     // the chosen subcommand; returns the exit status
 };
 
@@ -26,6 +27,13 @@ struct Context {
 // action when the command line chooses it.
 CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name, const std::string &description,
                      std::function<int()> run);
+
+// Adds --json to a group of subcommands, so that it may also stand between the group and the subcommand.
+void AddJsonFlag(CLI::App &command, Context &context);
+
+// A command-line value that must be a number from low to high (whole when whole is set), refused
+// with "'<text>' is not <what> from <low> to <high>".
+CLI::Validator NumberFrom(double low, double high, const std::string &what, bool whole = false);
 
 // Adds --wait SECONDS to a subcommand whose lock failure leaves nothing behind (see RunWaiting).
 void AddWaitOption(CLI::App &command, Context &context);
@@ -38,6 +46,12 @@ void AddWaitOption(CLI::App &command, Context &context);
 bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
                 const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
                 const char *daemonState = nullptr);
+
+// Whether the user confirms question ("wipe ... of share photo"): yes with --yes; on a terminal,
+// asked on standard error and answered "y" or "yes" on standard input; refused otherwise, with the
+// failure: kInvalid without a terminal ("needs --yes"), kFailed when not confirmed.
+bool Confirmed(const Context &context, const std::string &what, const std::string &question,
+               fileindex_tool::Failure &failure);
 
 // Adds the PATH arguments of a subcommand, and the --path-bytes flag that reads them as
 // percent-encoded bytes (path_encoding.h).

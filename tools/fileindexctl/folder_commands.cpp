@@ -1,4 +1,5 @@
 // fileindexctl folder list|get|add|set|remove: the folder list.
+#include <algorithm>
 #include <array>
 #include <iostream>
 #include <memory>
@@ -89,19 +90,23 @@ Json::Value SettingRequest(const SettingOptions &options, bool adding)
     return request;
 }
 
-// Prints the stored records of paths after a change.
-int ShowStored(const Context &context, const std::string &what, const std::string &verb,
-               const std::vector<std::string> &paths)
+// Prints the stored records of paths after a change: "changed" for those already in before, the
+// folder list read before the change, "added" for the others.
+int ShowStored(const Context &context, const std::string &what, const std::vector<std::string> &paths,
+               const std::vector<Folder> &before)
 {
     std::vector<Folder> folders;
+    ClearLastError();
     if (!ListFolders(folders)) {
         return Report(context, LibraryFailure(what, kReadHint));
     }
     const std::vector<Folder> stored = FoldersAt(folders, paths);
     if (context.json) {
         PrintJson(fileindex_tool::FolderRecords(stored));
-    } else {
-        PrintFolderLines(verb, stored);
+        return kSuccess;
+    }
+    for (const Folder &folder : stored) {
+        PrintFolderLines(FoldersAt(before, {folder.m_path}).empty() ? "added" : "changed", {folder});
     }
     return kSuccess;
 }
@@ -113,12 +118,17 @@ int Add(const Context &context, SettingOptions &options)
         !CheckSettingPaths("folder add", options, failure)) {
         return Report(context, failure);
     }
+    std::vector<Folder> before;
+    ClearLastError();
+    if (!ListFolders(before)) {
+        return Report(context, LibraryFailure("folder add", kReadHint));
+    }
     const Json::Value request = SettingRequest(options, true);
     if (!RunWaiting(context, &kFolderListLock, "folder add", kFollowUpHint, [&request]() { return IndexMgr::Add(request); },
                     failure, kSaved)) {
         return Report(context, failure);
     }
-    return ShowStored(context, "folder add", "added", options.paths);
+    return ShowStored(context, "folder add", options.paths, before);
 }
 
 // Changes what the command line gives of a folder already in the list; an unknown path fails with
@@ -130,6 +140,15 @@ int Set(const Context &context, SettingOptions &options)
     if (!TakePaths(context, "folder set", options.paths, failure)) {
         return Report(context, failure);
     }
+    const bool anyGiven = options.nameGiven->count() != 0 ||
+                          std::any_of(options.given.begin(), options.given.end(),
+                                      [](const CLI::Option *option) { return option->count() != 0; });
+    if (!anyGiven) {
+        return Report(context, fileindex_tool::ToolFailure(
+                                   fileindex_tool::FailureKind::kInvalid, Failure::kNoCode,
+                                   "folder set: nothing to change; give --name, or --document, --audio, --video or "
+                                   "--photo with on or off"));
+    }
     Json::Value record;
     const std::string what = "folder set " + TerminalText(options.paths.front());
     const Json::Value request = SettingRequest(options, false);
@@ -140,7 +159,9 @@ int Set(const Context &context, SettingOptions &options)
                     failure, kSaved)) {
         return Report(context, failure);
     }
-    return ShowStored(context, "folder set", "changed", options.paths);
+    Folder existing;
+    existing.m_path = options.paths.front();
+    return ShowStored(context, "folder set", options.paths, {existing});
 }
 
 int Remove(const Context &context, std::vector<std::string> &paths)
@@ -277,13 +298,17 @@ void AddFolderCommands(CLI::App &app, Context &context)
 {
     CLI::App *folder = app.add_subcommand("folder", "the indexed folders: list, get, add, set, remove");
     folder->require_subcommand(1);
+    AddJsonFlag(*folder, context);
 
     auto list = std::make_shared<ListOptions>();
     CLI::App *listCommand = AddCommand(*folder, context, "list", "list the indexed folders, a page at a time",
                                        [&context, list]() { return List(context, *list); });
     listCommand->add_option("--offset", list->offset, "skip this many folders of the sorted list")
+        ->check(NumberFrom(0, 1000000, "a whole number", true))
         ->capture_default_str();
-    listCommand->add_option("--limit", list->limit, "list at most this many folders")->capture_default_str();
+    listCommand->add_option("--limit", list->limit, "list at most this many folders")
+        ->check(NumberFrom(0, 1000000, "a whole number", true))
+        ->capture_default_str();
     listCommand->add_option("--sort", list->sortBy, "sort by name, path, or a media flag (folders without it first)")
         ->check(CLI::IsMember({"name", "path", "document", "audio", "video", "photo"}))
         ->capture_default_str();

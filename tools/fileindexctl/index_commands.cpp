@@ -56,17 +56,19 @@ int Check(const Context &context, std::vector<std::string> &paths)
         return Report(context, failure);
     }
     Json::Value checks(Json::arrayValue);
+    bool allMayBeIndexed = true;
     for (const std::string &path : paths) {
         checks.append(fileindex_tool::CheckReport(path));
+        allMayBeIndexed = allMayBeIndexed && checks[checks.size() - 1]["may_be_indexed"].asBool();
     }
     if (context.json) {
         PrintJson(checks);
-        return kSuccess;
+    } else {
+        for (Json::ArrayIndex i = 0; i < checks.size(); ++i) {
+            PrintCheck(paths[i], checks[i]);
+        }
     }
-    for (Json::ArrayIndex i = 0; i < checks.size(); ++i) {
-        PrintCheck(paths[i], checks[i]);
-    }
-    return kSuccess;
+    return allMayBeIndexed ? kSuccess : kRefused;
 }
 
 int Reindex(const Context &context, std::vector<std::string> &paths)
@@ -137,7 +139,8 @@ void AddIndexCommands(CLI::App &app, Context &context)
     auto paths = std::make_shared<std::vector<std::string>>();
     CLI::App *check =
         AddCommand(app, context, "check",
-                   "is a path indexed, does it hold indexed folders, may it be indexed, and which rule refuses it",
+                   "is a path indexed, does it hold indexed folders, may it be indexed, and which rule refuses it; "
+                   "exits 3 when a path may not be indexed (or does not resolve)",
                    [&context, paths]() { return Check(context, *paths); });
     AddPaths(*check, context, *paths, "share-relative paths, /<share>/<folder>")->required();
 

@@ -1,84 +1,84 @@
 // fileindexctl: shows and changes the appliance's file index through libfileindex's exported
 // interface. Tables for people by default, one JSON document with --json; a failure is one line on
 // standard error (and the error object with --json) and an exit status of its kind (output.h).
+#include <algorithm>
+#include <cstring>
 #include <string>
+#include <vector>
 
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
-#include "daemon_probe.h"
-#include "fileindex/error.h"
 #include "output.h"
-#include "path_checks.h"
-#include "path_encoding.h"
 
 namespace fileindexctl {
+namespace {
 
-CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name, const std::string &description,
-                     std::function<int()> run)
+// Edits (insertions, deletions, substitutions) that turn one word into the other.
+size_t EditDistance(const std::string &from, const std::string &to)
 {
-    CLI::App *command = parent.add_subcommand(name, description);
-    command->add_flag("--json", context.json, "print one JSON document (docs/fileindexctl.md gives each shape)");
-    command->callback([&context, run]() { context.action = run; });
-    return command;
-}
-
-void AddWaitOption(CLI::App &command, Context &context)
-{
-    command.add_option("--wait", context.wait,
-                       "while another program holds the lock this command needs, try again for up to this many "
-                       "seconds (0: give up at once); a lock still busy then exits 75")
-        ->check(CLI::Range(0.0, 3600.0))
-        ->capture_default_str()
-        ->type_name("SECONDS");
-}
-
-bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
-                const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
-                const char *daemonState)
-{
-    if (fileindex_tool::RetryWhileBusy(lock == nullptr ? 0 : context.wait, call)) {
-        return true;
+    std::vector<size_t> row(to.size() + 1);
+    for (size_t j = 0; j <= to.size(); ++j) {
+        row[j] = j;
     }
-    if (lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
-        failure = fileindex_tool::BusyFailure(what, *lock, context.wait);
-    } else if (daemonState != nullptr) {
-        failure = fileindex_tool::DaemonFailure(what, daemonState, withoutCode);
-    } else {
-        failure = fileindex_tool::LibraryFailure(what, withoutCode);
-    }
-    return false;
-}
-
-CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::string> &paths,
-                      const std::string &description)
-{
-    command.add_flag("--path-bytes", context.pathBytes,
-                     "read each PATH as percent-encoded bytes, the \"path_bytes\" form of the JSON records");
-    return command.add_option("PATH", paths, description);
-}
-
-bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
-               fileindex_tool::Failure &failure, bool asFolders)
-{
-    for (std::string &path : paths) {
-        if (context.pathBytes && !fileindex_tool::PercentDecode(path, path)) {
-            failure = fileindex_tool::ToolFailure(
-                fileindex_tool::FailureKind::kInvalid, fileindex_tool::Failure::kNoCode,
-                what + ": " + fileindex_tool::TerminalText(path) + " is not percent-encoded (a \"%\" must be "
-                "followed by two hex digits); --path-bytes takes the \"path_bytes\" form of the JSON records");
-            return false;
-        }
-        if (asFolders && !fileindex_tool::NormaliseFolderPath(what, path, path, failure)) {
-            return false;
-        }
-        while (path.size() > 1 && path.back() == '/') {
-            path.pop_back();
+    for (size_t i = 1; i <= from.size(); ++i) {
+        size_t diagonal = row[0];
+        row[0] = i;
+        for (size_t j = 1; j <= to.size(); ++j) {
+            const size_t above = row[j];
+            row[j] = std::min({row[j] + 1, row[j - 1] + 1, diagonal + (from[i - 1] == to[j - 1] ? 0 : 1)});
+            diagonal = above;
         }
     }
-    return true;
+    return row[to.size()];
 }
 
+// The first word of the command line that should name a subcommand and names none: "unknown
+// command 'foldr'; did you mean 'folder'?", the suggestion being the nearest visible subcommand
+// within two edits, or one the word begins. Empty when every command word is known.
+std::string UnknownCommand(const CLI::App &app, int argc, char **argv)
+{
+    const CLI::App *current = &app;
+    for (int i = 1; i < argc && !current->get_subcommands({}).empty(); ++i) {
+        const std::string word = argv[i];
+        if (word.rfind("-", 0) == 0) {
+            i += word == "--wait" ? 1 : 0;  // the one option before a subcommand that takes a value
+            continue;
+        }
+        const CLI::App *next = nullptr;
+        std::string nearest;
+        size_t nearestDistance = 3;
+        for (const CLI::App *command : current->get_subcommands({})) {
+            if (command->get_name() == word) {
+                next = command;
+            } else if (!command->get_group().empty()) {
+                const size_t distance = command->get_name().rfind(word, 0) == 0 ? 0 : EditDistance(word, command->get_name());
+                if (distance < nearestDistance) {
+                    nearest = command->get_name();
+                    nearestDistance = distance;
+                }
+            }
+        }
+        if (next == nullptr) {
+            const std::string under = current == &app ? "" : " of '" + current->get_name() + "'";
+            return "unknown command '" + word + "'" + under +
+                   (nearest.empty() ? "" : "; did you mean '" + nearest + "'?");
+        }
+        current = next;
+    }
+    return "";
+}
+
+// The failure of a wrong command line, as one line on standard error and, when --json is among the
+// arguments, the error object on standard output.
+int UsageFailure(const Context &context, const std::string &message)
+{
+    Report(context, fileindex_tool::ToolFailure(fileindex_tool::FailureKind::kInvalid,
+                                                fileindex_tool::Failure::kNoCode, message + " (see --help)"));
+    return kUsage;
+}
+
+}  // namespace
 }  // namespace fileindexctl
 
 int main(int argc, char **argv)
@@ -90,30 +90,37 @@ int main(int argc, char **argv)
                  "fileindexctl"};
     app.set_version_flag("--version", "fileindexctl " FILEINDEX_VERSION);
     app.require_subcommand(1);
-    app.failure_message([](const CLI::App *, const CLI::Error &error) {
-        return "fileindexctl: " + std::string(error.what()) + " (see --help)\n";
-    });
-    app.footer("Every subcommand takes --json and has its own --help. Paths are share-relative, /<share>/<folder>, "
-               "unless a subcommand says otherwise.\n"
+    app.footer("--json may come before or after the subcommand; every subcommand has its own --help. Paths are "
+               "share-relative, /<share>/<folder>, unless a subcommand says otherwise.\n"
                "A busy lock: folder get/add/set/remove, share remove/rename/revive, pause and resume take their "
                "lock before they do anything, so they try again while another program holds it, for up to --wait "
                "seconds. The other subcommands take no lock of their own, or may have done part of their work "
                "when they meet one, and fail at once.\n"
                "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
-               "code and what to try), 2 wrong command line, 3 the path may not be indexed, 4 no such share, "
-               "path or folder, 5 fileindexd was not told (the line says what stands), 75 a lock stayed busy.");
+               "code and what to try), 2 wrong command line, 3 a path may not be indexed (check, folder add/set), "
+               "4 no such share, path or folder, 5 fileindexd was not told (the line says what stands), 75 a lock "
+               "stayed busy, 130 interrupted.");
 
     Context context;
+    app.add_flag("--json", context.json, "print one JSON document (docs/fileindexctl.md gives each shape)");
+    AddWaitOption(app, context);
     AddFolderCommands(app, context);
     AddIndexCommands(app, context);
     AddStatusCommands(app, context);
     AddShareCommands(app, context);
 
+    context.json = std::any_of(argv + 1, argv + argc, [](const char *arg) { return strcmp(arg, "--json") == 0; });
+    const std::string unknown = UnknownCommand(app, argc, argv);
+    if (!unknown.empty()) {
+        return UsageFailure(context, unknown);
+    }
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {
-        const int status = app.exit(error);
-        return status == 0 ? kSuccess : kUsage;
+        if (error.get_exit_code() == 0) {
+            return app.exit(error);  // --help, --version
+        }
+        return UsageFailure(context, error.what());
     }
     return context.action ? context.action() : kUsage;
 }

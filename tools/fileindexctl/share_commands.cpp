@@ -169,8 +169,8 @@ int Rename(const Context &context, const std::string &from, const std::string &t
 
 // A share subcommand that is one library call: what it calls, the lock it takes before anything
 // else (retried under --wait; null for none), what a failure without a code may mean, what stands
-// when fileindexd was not told (null for a call that does not talk to it), and the line printed on
-// success.
+// when fileindexd was not told (null for a call that does not talk to it), the question to confirm
+// first (null for none), and the line printed on success.
 struct ShareAction {
     const char *name;
     const char *description;
@@ -178,22 +178,23 @@ struct ShareAction {
     const fileindex_tool::LockFile *lock;
     const char *failureHint;
     const char *daemonState;
+    const char *question;  // asked before the call, about the share (null: none)
     const char *doneLine;
 };
 
 const ShareAction kShareActions[] = {
     {"pause", "stop indexing the share: fileindexd deletes its worker, change monitoring removed",
      IndexMgr::SharePause, nullptr, "the share's change monitoring could not be removed; the system log says why",
-     "nothing changed", "fileindexd told to delete its worker, change monitoring removed"},
+     "nothing changed", nullptr, "fileindexd told to delete its worker, change monitoring removed"},
     {"resume", "index the share again: change monitoring registered, fileindexd revives its worker",
      IndexMgr::ShareResume, nullptr,
      "the share's change monitoring could not be registered, or fileindexd did not take the command; the system "
      "log says which",
-     "", "change monitoring registered, fileindexd told to revive its worker"},
+     "", nullptr, "change monitoring registered, fileindexd told to revive its worker"},
     {"clean", "wipe the share's event queue and index database", IndexMgr::CleanShareIndexData, nullptr,
-     kUnknownShareHint, nullptr, "event queue and index database removed"},
+     kUnknownShareHint, nullptr, "wipe the event queue and index database of share", "event queue and index database removed"},
     {"revive", "clear the share's out-of-space mark and tell fileindexd to revive the share's worker",
-     StatusMgr::ShareRevive, &fileindex_tool::kStatusLock, kReadHint, "the out-of-space mark is cleared",
+     StatusMgr::ShareRevive, &fileindex_tool::kStatusLock, kReadHint, "the out-of-space mark is cleared", nullptr,
      "out-of-space mark cleared, fileindexd told to revive its worker"},
 };
 
@@ -202,6 +203,9 @@ int RunShareAction(const Context &context, const ShareAction &action, const std:
     Failure failure;
     const auto call = [&action, &share]() { return action.call(share); };
     if (!fileindex_tool::CheckShareExists(What(action.name, share), share, failure) ||
+        (action.question != nullptr &&
+         !Confirmed(context, What(action.name, share), std::string(action.question) + " " + TerminalText(share),
+                    failure)) ||
         !RunWaiting(context, action.lock, What(action.name, share), action.failureHint, call, failure,
                     action.daemonState)) {
         return Report(context, failure);
@@ -227,6 +231,7 @@ void AddShareCommands(CLI::App &app, Context &context)
     CLI::App *share = app.add_subcommand("share", "shared folders: remove, rename, pause, resume, clean, revive, "
                                                   "space, paths");
     share->require_subcommand(1);
+    AddJsonFlag(*share, context);
     AddWaitOption(*AddShareCommand(*share, context, "remove",
                                    "the share is gone: drop its folder settings (the last ones stop fileindexd)",
                                    Remove),
@@ -245,6 +250,9 @@ void AddShareCommands(CLI::App &app, Context &context)
                                             });
         if (action.lock != nullptr) {
             AddWaitOption(*command, context);
+        }
+        if (action.question != nullptr) {
+            command->add_flag("--yes", context.yes, "do not ask: needed when standard input is not a terminal");
         }
     }
     AddShareCommand(*share, context, "space",

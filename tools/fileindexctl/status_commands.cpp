@@ -126,15 +126,7 @@ void AddStatusCommands(CLI::App &app, Context &context)
     statusCommand->add_option("--interval", status->interval, "seconds between redraws, from 0.05 to 3600")
         ->capture_default_str()
         ->type_name("SECONDS")
-        ->check(CLI::Validator(
-            [](std::string &text) {
-                char *end = nullptr;
-                const double seconds = strtod(text.c_str(), &end);
-                return !text.empty() && *end == '\0' && seconds >= 0.05 && seconds <= 3600
-                           ? std::string()
-                           : "'" + text + "' is not a number of seconds from 0.05 to 3600";
-            },
-            "SECONDS"));
+        ->check(NumberFrom(0.05, 3600, "a number of seconds"));
 
     auto hours = std::make_shared<long long>(0);
     CLI::App *pause = AddCommand(app, context, "pause", "pause indexing and tell fileindexd",
