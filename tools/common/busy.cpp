@@ -70,6 +70,16 @@ std::string LockHolder(const std::string &lockPath)
 
 bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call)
 {
+    return RetryWhileBusy(waitSeconds, [&call](bool &busy) {
+        ClearLastError();
+        const bool done = call();
+        busy = !done && ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK;
+        return done;
+    });
+}
+
+bool RetryWhileBusy(double waitSeconds, const std::function<bool(bool &busy)> &attempt)
+{
     using Clock = std::chrono::steady_clock;
     const Clock::time_point deadline =
         Clock::now() + std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(waitSeconds));
@@ -77,9 +87,9 @@ bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call)
                             static_cast<unsigned>(Clock::now().time_since_epoch().count()));
     std::chrono::milliseconds backOff(10);
     for (;;) {
-        ClearLastError();
-        const bool done = call();
-        if (done || ErrorHandler::GetError() != VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
+        bool busy = false;
+        const bool done = attempt(busy);
+        if (done || !busy) {
             return done;
         }
         const Clock::time_point now = Clock::now();

@@ -30,6 +30,10 @@ std::string LockHolder(const std::string &lockPath);
 // error is cleared before each attempt, so it tells why the last one failed. Only for operations
 // whose lock failure leaves nothing behind: the call is repeated whole. waitSeconds 0 is one attempt.
 bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call);
+// The same for a program whose threads share the library (the panel): attempt clears and reads the
+// last error itself, where it has the library to itself, and sets busy when it failed on a lock;
+// the sleeps between attempts happen outside it.
+bool RetryWhileBusy(double waitSeconds, const std::function<bool(bool &busy)> &attempt);
 
 // The failure of an operation whose lock stayed busy: "<what>: <lock> (<path>) is held by <holder>;
 // still busy after <waitSeconds> s; retry once that process is done" (without the "still busy" part

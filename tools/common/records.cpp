@@ -1,6 +1,8 @@
 // The JSON records the tools print and serve, built from the library's records.
 #include "records.h"
 
+#include <algorithm>
+#include <iterator>
 #include <set>
 
 #include "fileindex/status.h"
@@ -65,6 +67,24 @@ Json::Value FolderPage(const Json::Value &libraryPage)
         page["folders"].append(FolderRecord(record));
     }
     return page;
+}
+
+std::vector<Folder> FoldersAt(const std::vector<Folder> &folders, const std::vector<std::string> &paths)
+{
+    const std::set<std::string> wanted(paths.begin(), paths.end());
+    std::vector<Folder> found;
+    std::copy_if(folders.begin(), folders.end(), std::back_inserter(found),
+                 [&wanted](const Folder &folder) { return wanted.count(folder.m_path) != 0; });
+    return found;
+}
+
+Json::Value PathArray(const std::vector<std::string> &paths)
+{
+    Json::Value array(Json::arrayValue);
+    for (const std::string &path : paths) {
+        array.append(path);
+    }
+    return array;
 }
 
 Json::Value ShareMarks(const std::string &share)

@@ -23,6 +23,12 @@ Json::Value FolderRecords(const std::vector<VEXO::FILEINDEX::Folder> &folders);
 // A page of IndexMgr::List: {"total", "offset", "folders": [FolderRecord...]}.
 Json::Value FolderPage(const Json::Value &libraryPage);
 
+// The folders whose paths are among paths, in list order.
+std::vector<VEXO::FILEINDEX::Folder> FoldersAt(const std::vector<VEXO::FILEINDEX::Folder> &folders,
+                                                const std::vector<std::string> &paths);
+// The paths as a JSON array of strings, the request form of the library's batch operations.
+Json::Value PathArray(const std::vector<std::string> &paths);
+
 // A share's marks in status.conf: {"share_name", "share_name_bytes", "no_space", "need_reindex"}.
 // Reads status.conf without its lock, twice; a mark that cannot be read counts as absent.
 Json::Value ShareMarks(const std::string &share);

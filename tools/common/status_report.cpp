@@ -1,6 +1,8 @@
 // The tools' indexing progress report: pause state, folder states, share marks, daemon reachability.
 #include "status_report.h"
 
+#include <map>
+
 #include "appliance_paths.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/status.h"
@@ -26,8 +28,20 @@ bool TakeStatusReport(const std::vector<std::string> &paths, StatusReport &repor
     }
     report.folders.clear();
     if (paths.empty()) {
+        // Every folder's state from one listing, which reads each share's queue once for all its
+        // folders; a folder the listing did not see (folder.conf changed in between) is asked alone.
+        Json::Value page, additional(Json::arrayValue);
+        additional.append("status");
+        std::map<std::string, std::string> states;
+        if (IndexMgr::List(page, 0, list.size(), "path", "", additional)) {
+            for (const Json::Value &record : page["folder"]) {
+                states[record["path"].asString()] = record["additional"]["status"].asString();
+            }
+        }
         for (const Folder &folder : list) {
-            report.folders.push_back({folder.m_path, StatusMgr::GetFolderStatus(folder.m_path)});
+            const auto state = states.find(folder.m_path);
+            report.folders.push_back(
+                {folder.m_path, state != states.end() ? state->second : StatusMgr::GetFolderStatus(folder.m_path)});
         }
     } else {
         for (const std::string &path : paths) {

@@ -18,24 +18,6 @@ bool ListFolders(std::vector<Folder> &folders, const std::string &share)
     return list.Load() && list.List(folders, share);
 }
 
-std::vector<Folder> FoldersAt(const std::vector<Folder> &folders, const std::vector<std::string> &paths)
-{
-    std::vector<Folder> found;
-    std::copy_if(folders.begin(), folders.end(), std::back_inserter(found), [&paths](const Folder &folder) {
-        return std::find(paths.begin(), paths.end(), folder.m_path) != paths.end();
-    });
-    return found;
-}
-
-Json::Value PathArray(const std::vector<std::string> &paths)
-{
-    Json::Value array(Json::arrayValue);
-    for (const std::string &path : paths) {
-        array.append(path);
-    }
-    return array;
-}
-
 std::string MediaText(const Json::Value &record)
 {
     std::string media;

@@ -8,18 +8,15 @@
 #include <json/value.h>
 
 #include "fileindex/folder.h"
+#include "records.h"
 
 namespace fileindexctl {
 
 // The folder settings of one share (exact name), or all of them for "", read from folder.conf
 // without its lock. False when folder.conf cannot be read (the library's error code tells why).
 bool ListFolders(std::vector<VEXO::FILEINDEX::Folder> &folders, const std::string &share = std::string());
-// The folders whose paths are among paths, in list order.
-std::vector<VEXO::FILEINDEX::Folder> FoldersAt(const std::vector<VEXO::FILEINDEX::Folder> &folders,
-                                                const std::vector<std::string> &paths);
-
-// The paths as a JSON array of strings, the request form of the library's batch operations.
-Json::Value PathArray(const std::vector<std::string> &paths);
+using fileindex_tool::FoldersAt;
+using fileindex_tool::PathArray;
 
 // The media a library record (Folder::asJson) indexes, "document,photo", or "-" for none.
 std::string MediaText(const Json::Value &record);
