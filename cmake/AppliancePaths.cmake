@@ -14,6 +14,7 @@ set(FILEINDEX_FOLDER_LOCK_PATH "${FILEINDEX_ROOT_CLEAN}/tmp/fileidx_cfg_folder.l
 set(FILEINDEX_STATUS_LOCK_PATH "${FILEINDEX_ROOT_CLEAN}/tmp/fileidx_cfg_status.lock")
 set(FILEINDEX_DAEMON_SOCKET_PATH "${FILEINDEX_ROOT_CLEAN}/var/run/fileindexd.sock")
 set(FILEINDEX_NOTIFY_TOOL_PATH "${FILEINDEX_ROOT_CLEAN}/usr/vexo/bin/vexohvxnotify")
+set(FILEINDEX_PANEL_TOKEN_PATH "${FILEINDEX_ROOT_CLEAN}/usr/vexo/etc/fileindex/panel.token")
 set(FILEINDEX_EMULATION_STATE_DIR "${FILEINDEX_ROOT_CLEAN}/emulation")
 
 string(LENGTH "${FILEINDEX_DAEMON_SOCKET_PATH}" _socket_length)
