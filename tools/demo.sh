@@ -19,18 +19,11 @@ root=$1
 state=$2
 tools=$(cd "$3" && pwd)
 export PATH="$tools:$PATH"
+# shellcheck source=tools/sandbox_appliance.sh
+source "$(dirname "${BASH_SOURCE[0]}")/sandbox_appliance.sh"
 
 step() {
     printf '\n== %s\n' "$*"
-}
-
-# Ends the stand-in daemon that the emulated service start launched, if it still runs.
-stop_standin() {
-    local pid
-    pid=$(sed -n 's/.*"fileindexd":{[^}]*"pid":\([0-9]*\).*/\1/p' "$state/services.json" 2>/dev/null || true)
-    if [ -n "$pid" ] && grep -qs fileindex-standin-daemon "/proc/$pid/cmdline"; then
-        kill "$pid" 2>/dev/null || true
-    fi
 }
 
 # A walk that stops early leaves no daemon behind.
@@ -73,54 +66,6 @@ wait_for() {
     done
     echo "gave up waiting for: $1" >&2
     return 1
-}
-
-# A sandbox appliance: the directories of its fixed files, the shares of the emulated share
-# database with a few files each, the administrators' notification tool, and the stand-in daemon as
-# the command of the "fileindexd" service.
-set_up_appliance() {
-    stop_standin  # one left running by an interrupted walk
-    mkdir -p "$root"
-    find "$root" -mindepth 1 -maxdepth 1 -exec rm -rf {} +
-    mkdir -p "$root/usr/vexo/etc/fileindex" "$root/usr/vexo/bin" "$root/tmp" "$root/var/run" "$state"
-
-    cd "$root"
-    mkdir -p volume1/photo/holiday volume1/photo/family volume1/photo/usb volume1/photo/#recycle \
-        volume1/photo/#snapshot/GMT+00-2024.06.01/holiday volume1/video/films volume1/docs/cdrom \
-        volume2/music/albums volume2/vault volume2/archive volume2/surveillance/cam1
-    touch volume1/photo/holiday/beach.jpg volume1/photo/holiday/sunset.jpg volume1/photo/family/birthday.jpg \
-        volume1/photo/#recycle/blurred.jpg volume1/photo/#snapshot/GMT+00-2024.06.01/holiday/beach.jpg \
-        volume1/video/films/harbour.mp4 volume1/docs/manual.pdf volume2/music/albums/overture.flac \
-        volume2/vault/keys.txt volume2/archive/2019.tar
-    ln -s holiday volume1/photo/latest
-
-    cat >emulation/shares.json <<EOF
-[
-  {"name": "photo", "path": "$root/volume1/photo"},
-  {"name": "video", "path": "$root/volume1/video"},
-  {"name": "docs", "path": "$root/volume1/docs"},
-  {"name": "music", "path": "$root/volume2/music"},
-  {"name": "vault", "path": "$root/volume2/vault", "encrypted": true, "uses_encryption": true},
-  {"name": "archive", "path": "$root/volume2/archive", "read_only": true},
-  {"name": "surveillance", "path": "$root/volume2/surveillance"}
-]
-EOF
-    # A USB disk mounted inside photo and a CD image inside docs, as the platform would report them.
-    cat >emulation/faults.json <<EOF
-{"VEXOFSDirIsMntPoint": [{"match": "$root/volume1/photo/usb", "result": 1}],
- "VEXOGetFSType": [{"match": "$root/volume1/docs/cdrom", "result": 10}]}
-EOF
-    # The service's start returns once the daemon listens on its socket.
-    cat >emulation/service_commands.json <<EOF
-{"fileindexd": {"command": ["$tools/fileindex-standin-daemon", "--output", "$root/fileindexd-commands.jsonl",
-                            "--process-queues", "--record-time", "300"],
-                "ready": "$root/var/run/fileindexd.sock"}}
-EOF
-    cat >usr/vexo/bin/vexohvxnotify <<EOF
-#!/bin/sh
-echo "\$*" >>"$root/notifications.log"
-EOF
-    chmod 755 usr/vexo/bin/vexohvxnotify
 }
 
 printf 'libfileindex demo: a sandbox appliance in %s\n' "$root"
@@ -207,3 +152,16 @@ cat <<EOF
 The frames the daemon received are in fileindexd-commands.jsonl, the platform's calls in
 emulation/journal.jsonl. The next run of the demo sets this sandbox up afresh.
 EOF
+
+# On a terminal the appliance stays up with its web panel until Ctrl-C; elsewhere (CI) the walk
+# ends here.
+if [ -t 0 ] && [ -t 1 ]; then
+    step "The web panel: the same appliance in a browser (Ctrl-C ends it)"
+    run fileindexctl folder add /photo/family /music --photo --audio
+    printf 'Open the address below (it carries the panel'"'"'s token, kept in %s):\n' \
+        "$root/usr/vexo/etc/fileindex/panel.token"
+    status=0
+    fileindex-panel --listen 127.0.0.1:8642 || status=$?
+    stop_standin
+    [ "$status" -eq 0 ] || printf '(fileindex-panel ended with status %d; is port 8642 taken? Stop the other panel, then run the demo again)\n' "$status"
+fi
