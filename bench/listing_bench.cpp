@@ -1,7 +1,12 @@
 // The paged listing of 1000 folders with each folder's "status", all in one share whose event queue
-// holds 1M records about a tenth of them, next to one std::getline pass over that queue.
+// holds 1M records about a tenth of them, next to one std::getline pass over that queue. On the same
+// data, the web panel's GET /api/v1/folders of that page with state and validity, next to
+// IndexMgr::List of the same page in this process: what the panel adds (HTTP, its checks, the
+// records) to the library's listing. Both in wall-clock time, since the panel works in another
+// process.
 #include <cstdio>
 
+#include "bench/panel_process.h"
 #include "bench/sandbox.h"
 #include "fileindex/index_mgr.h"
 
@@ -57,5 +62,28 @@ int main(int argc, char **argv)
         }
         std::rename(away.c_str(), queue.c_str());
     });
+
+    const PanelProcess panel;
+    const std::unique_ptr<httplib::Client> client = panel.Client();
+    Json::Value withValidity = additional;
+    withValidity.append("is_valid");
+    Register("P6/baseline:List_status_is_valid", [&](benchmark::State &state) {
+        for (auto _ : state) {
+            Json::Value page;
+            if (!IndexMgr::List(page, 0, folders.size(), "path", "", withValidity) ||
+                page["folder"].size() != folders.size()) {
+                state.SkipWithError("the listing failed");
+            }
+        }
+    })->UseRealTime();
+    const std::string target = "/api/v1/folders?offset=0&limit=" + std::to_string(folders.size());
+    Register("P6/GET_folders", [&](benchmark::State &state) {
+        for (auto _ : state) {
+            const httplib::Result result = client->Get(target.c_str());
+            if (!result || result->status != 200) {
+                state.SkipWithError("the panel did not answer 200");
+            }
+        }
+    })->UseRealTime();
     return RunBenchmarks();
 }

@@ -19,6 +19,7 @@
 #include "appliance_paths.h"
 #include "config/file_io.h"
 #include "config/json_io.h"
+#include "platform/service.h"
 #include "share/storage_paths.h"
 
 namespace fileindex_bench {
@@ -266,6 +267,32 @@ size_t GetlinePass(const std::string &path)
         ++lines;
     }
     return lines;
+}
+
+const std::string kStandInCommands = FILEINDEX_ROOT_DIR "/commands.jsonl";
+
+void StartStandInDaemon(const std::vector<std::string> &arguments)
+{
+    Json::Value commands;
+    for (const std::string &word : {std::string(FILEINDEX_STANDIN_DAEMON), std::string("--output"), kStandInCommands}) {
+        commands["fileindexd"].append(word);
+    }
+    for (const std::string &word : arguments) {
+        commands["fileindexd"].append(word);
+    }
+    if (!VEXO::FILEINDEX::ReplaceFileAtomically(FILEINDEX_EMULATION_STATE_DIR "/service_commands.json",
+                                                VEXO::FILEINDEX::toString(commands)) ||
+        VLIBServiceStart("fileindexd", 1) < 0) {
+        Fail("cannot start the stand-in daemon");
+    }
+    for (int i = 0; i < 500 && access(FILEINDEX_DAEMON_SOCKET_PATH, F_OK) != 0; ++i) {
+        usleep(10000);
+    }
+}
+
+void StopStandInDaemon()
+{
+    VLIBServiceStop("fileindexd", 1);
 }
 
 }  // namespace fileindex_bench

@@ -53,6 +53,12 @@ size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::
 // not tell): measured in a child process that has handed its free heap memory back first.
 long PeakMemoryGrowthKiB(const std::function<void()> &run);
 
+// Starts fileindex-standin-daemon, with these arguments besides --output kStandInCommands, as the
+// command of the emulated "fileindexd" service, and waits for its socket; StopStandInDaemon ends it.
+extern const std::string kStandInCommands;
+void StartStandInDaemon(const std::vector<std::string> &arguments);
+void StopStandInDaemon();
+
 // The baseline of every queue benchmark: one std::getline pass over the file; returns the lines.
 size_t GetlinePass(const std::string &path);
 
