@@ -15,7 +15,8 @@ cd "$(dirname "$0")"
 
 packages=(cmake ninja-build g++ pkg-config libjsoncpp-dev libunistring-dev libgtest-dev libcli11-dev
           help2man dpkg-dev file libbenchmark-dev jq lintian abigail-tools libcpp-httplib-dev
-          chromium chromium-driver python3-selenium)
+          chromium chromium-driver python3-selenium
+          groff-base bsdextrautils)  # the last two render the man pages for their test
 # Added for the fuzz targets: clang and its fuzzer and sanitizer runtimes.
 fuzz_packages=(clang libclang-rt-dev)
 

@@ -346,6 +346,44 @@ TEST_F(FileindexctlTest, TheCommandLineAsANewUserTypesIt)
     }
 }
 
+// Completion asks the tool: subcommands (not the hidden one), options, the values of --sort, --with
+// and the media switches, share names and indexed folders from the appliance's own files, and the
+// directories of a share for a folder to add; the bash function offers what the tool printed.
+TEST_F(FileindexctlTest, CompletionOffersWhatTheToolAndTheApplianceKnow)
+{
+    WriteFile(kFolderConf, R"({"/photo/a":{"path":"/photo/a","name":"A"},"/music":{"path":"/music","name":"M"}})");
+    WriteFile(FILEINDEX_STATUS_CONF_PATH, R"({"no_space":{"video":true}})");
+    stdfs::create_directories(SharePath("photo") + "/a");
+    stdfs::create_directories(SharePath("photo") + "/b");
+    const struct Row {
+        std::vector<std::string> words;
+        std::string offered;
+    } rows[] = {
+        {{""}, "check\nfolder\npause\nreindex\nresume\nshare\nstatus\nupgrade\n"},
+        {{"fo"}, "folder\n"},
+        {{"--json", "folder", "list", "--l"}, "--limit\n"},
+        {{"folder", "list", "--sort", ""}, "audio\ndocument\nname\npath\nphoto\nvideo\n"},
+        {{"folder", "list", "--with", "status,"}, "status,is_valid\n"},
+        {{"folder", "set", "/photo/a", "--audio", ""}, "off\non\n"},
+        {{"folder", "remove", "/"}, "/music\n/photo/a\n"},
+        {{"share", "revive", ""}, "music\nphoto\nvideo\n"},
+        {{"folder", "add", "/"}, "/music/\n/photo/\n/video/\n"},
+        {{"folder", "add", "--audio", "/photo/"}, "/photo/a/\n/photo/b/\n"},
+    };
+    for (const Row &row : rows) {
+        std::vector<std::string> args{"__complete", "--"};
+        args.insert(args.end(), row.words.begin(), row.words.end());
+        EXPECT_EQ(Ctl(args).out, row.offered) << row.words.back();
+    }
+    const std::string bash = "source " FILEINDEX_COMPLETION_SCRIPT "; COMP_WORDS=(" FILEINDEXCTL
+                             " share re); COMP_CWORD=2; _fileindexctl; printf '%s\\n' \"${COMPREPLY[@]}\"";
+    FILE *shell = popen(("bash -c '" + std::regex_replace(bash, std::regex("'"), "'\\''") + "'").c_str(), "r");
+    std::string offered(64, '\0');
+    offered.resize(fread(&offered[0], 1, offered.size(), shell));
+    pclose(shell);
+    EXPECT_EQ(offered, "remove\nrename\nresume\nrevive\n");
+}
+
 // A busy lock is not a failure. The commands whose lock comes before any effect try again until the
 // holder lets go; with --wait 0 they give up at once, exit 75 naming the holder, and leave folder.conf,
 // status.conf and the platform as they were.

@@ -155,7 +155,11 @@ int main(int argc, char **argv)
     app.add_option("--record-time", recordMilliseconds, "milliseconds one queue record takes")
         ->capture_default_str()
         ->check(CLI::NonNegativeNumber);
-    CLI11_PARSE(app, argc, argv);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError &error) {
+        return app.exit(error) == 0 ? 0 : 2;  // a wrong command line is status 2, as for fileindexctl
+    }
 
     struct sigaction action = {};
     action.sa_handler = OnSignal;

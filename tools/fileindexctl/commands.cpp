@@ -16,6 +16,11 @@
 
 namespace fileindexctl {
 
+const std::vector<std::string> kSortKeys = {"name", "path", "document", "audio", "video", "photo"};
+const std::vector<std::string> kAdditionalKeys = {"status", "is_valid"};
+const std::vector<std::string> kMedia = {"document", "audio", "video", "photo"};
+const std::vector<std::string> kSwitchValues = {"on", "off"};
+
 CLI::App *AddCommand(CLI::App &parent, Context &context, const std::string &name, const std::string &description,
                      std::function<int()> run)
 {
@@ -57,11 +62,9 @@ CLI::Validator NumberFrom(double low, double high, const std::string &what, bool
         "");
 }
 
-void AddWaitOption(CLI::App &command, Context &context)
+void AddWaitOption(CLI::App &command, Context &context, const std::string &description)
 {
-    command.add_option("--wait", context.wait,
-                       "while another program holds the lock this command needs, try again for up to this many "
-                       "seconds (0: give up at once); a lock still busy then exits 75")
+    command.add_option("--wait", context.wait, description)
         ->check(NumberFrom(0, 3600, "a number of seconds"))
         ->capture_default_str()
         ->type_name("SECONDS");

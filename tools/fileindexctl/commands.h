@@ -35,8 +35,10 @@ void AddJsonFlag(CLI::App &command, Context &context);
 // with "'<text>' is not <what> from <low> to <high>".
 CLI::Validator NumberFrom(double low, double high, const std::string &what, bool whole = false);
 
+constexpr char kWaitDescription[] = "while another program holds the lock this command needs, try again for up "
+                                    "to this many seconds (0: give up at once); a lock still busy then exits 75";
 // Adds --wait SECONDS to a subcommand whose lock failure leaves nothing behind (see RunWaiting).
-void AddWaitOption(CLI::App &command, Context &context);
+void AddWaitOption(CLI::App &command, Context &context, const std::string &description = kWaitDescription);
 // Runs call, and again while it fails because another process holds lock and --wait has not run
 // out. lock is the lock the operation takes before it does anything, so that a lock failure leaves
 // nothing behind; null for an operation that takes none of its own, or may have done part of its
@@ -63,10 +65,19 @@ CLI::Option *AddPaths(CLI::App &command, Context &context, std::vector<std::stri
 bool TakePaths(const Context &context, const std::string &what, std::vector<std::string> &paths,
                fileindex_tool::Failure &failure, bool asFolders = true);
 
+// The values of folder list's --sort and --with, the media of a folder setting, and the values of
+// folder set's media switches.
+extern const std::vector<std::string> kSortKeys;
+extern const std::vector<std::string> kAdditionalKeys;
+extern const std::vector<std::string> kMedia;
+extern const std::vector<std::string> kSwitchValues;
+
 void AddFolderCommands(CLI::App &app, Context &context);
 void AddIndexCommands(CLI::App &app, Context &context);
 void AddStatusCommands(CLI::App &app, Context &context);
 void AddShareCommands(CLI::App &app, Context &context);
+// The hidden "__complete -- WORDS...", which prints the words that may follow, one a line.
+void AddCompleteCommand(CLI::App &app, Context &context);
 
 }  // namespace fileindexctl
 

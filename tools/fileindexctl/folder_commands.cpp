@@ -34,14 +34,14 @@ const char kFollowUpHint[] = "a step that sets no error code failed (an empty pa
 const char kReadHint[] = "the library recorded no reason; the system log has its line";
 const char kSaved[] = "folder.conf is saved";
 
-constexpr std::array<const char *, 4> kMedia = {"document", "audio", "video", "photo"};
+constexpr size_t kMediaCount = 4;
 
 // What folder add and folder set put into the library's request.
 struct SettingOptions {
     std::vector<std::string> paths;
     std::string name;
-    std::array<bool, kMedia.size()> media = {};           // the value given for each medium
-    std::array<CLI::Option *, kMedia.size()> given = {};  // whether it was given at all
+    std::array<bool, kMediaCount> media = {};           // the value given for each medium
+    std::array<CLI::Option *, kMediaCount> given = {};  // whether it was given at all
     CLI::Option *nameGiven = nullptr;
     bool force = false;  // --force: store paths that do not exist or may not be indexed
 };
@@ -285,10 +285,11 @@ void AddSettingCommand(CLI::App &folder, Context &context, bool adding)
     command->add_flag("--force", options->force,
                       "store the path even when it does not exist or may not be indexed (its share must exist)");
     for (size_t i = 0; i < kMedia.size(); ++i) {
-        const std::string flag = std::string("--") + kMedia[i];
-        options->given[i] = adding ? command->add_flag(flag, options->media[i], std::string("index ") + kMedia[i])
+        const std::string flag = "--" + kMedia[i];
+        options->given[i] = adding ? command->add_flag(flag, options->media[i], "index " + kMedia[i])
                                    : command->add_option(flag, options->media[i],
-                                                         std::string("index ") + kMedia[i] + ": on or off");
+                                                         "index " + kMedia[i] + ": on or off")
+                                         ->type_name("on|off");
     }
 }
 
@@ -310,13 +311,13 @@ void AddFolderCommands(CLI::App &app, Context &context)
         ->check(NumberFrom(0, 1000000, "a whole number", true))
         ->capture_default_str();
     listCommand->add_option("--sort", list->sortBy, "sort by name, path, or a media flag (folders without it first)")
-        ->check(CLI::IsMember({"name", "path", "document", "audio", "video", "photo"}))
+        ->check(CLI::IsMember(kSortKeys))
         ->capture_default_str();
     listCommand->add_flag("--desc", list->descending,
                           "descending order; an offset then only shortens the page, as the library pages");
     listCommand->add_option("--with", list->additional, "additional columns: status, is_valid (comma-separated)")
         ->delimiter(',')
-        ->check(CLI::IsMember({"status", "is_valid"}));
+        ->check(CLI::IsMember(kAdditionalKeys));
 
     auto path = std::make_shared<std::vector<std::string>>();
     CLI::App *get = AddCommand(*folder, context, "get", "show one folder's setting (read under the folder lock)",

@@ -9,6 +9,7 @@
 #include <CLI/CLI.hpp>
 
 #include "commands.h"
+#include "help_format.h"
 #include "output.h"
 
 namespace fileindexctl {
@@ -88,26 +89,26 @@ int main(int argc, char **argv)
     CLI::App app{"Show and change the appliance's file index: indexed folders, indexing progress, pause and "
                  "resume, shares.",
                  "fileindexctl"};
+    app.formatter(WrappingFormatter());
     app.set_version_flag("--version", "fileindexctl " FILEINDEX_VERSION);
     app.require_subcommand(1);
-    app.footer("--json may come before or after the subcommand; every subcommand has its own --help. Paths are "
-               "share-relative, /<share>/<folder>, unless a subcommand says otherwise.\n"
-               "A busy lock: folder get/add/set/remove, share remove/rename/revive, pause and resume take their "
-               "lock before they do anything, so they try again while another program holds it, for up to --wait "
-               "seconds. The other subcommands take no lock of their own, or may have done part of their work "
-               "when they meet one, and fail at once.\n"
-               "Exit status: 0 success, 1 a library call failed (one line on standard error names the error "
-               "code and what to try), 2 wrong command line, 3 a path may not be indexed (check, folder add/set), "
-               "4 no such share, path or folder, 5 fileindexd was not told (the line says what stands), 75 a lock "
-               "stayed busy, 130 interrupted.");
+    app.footer("--json and --wait may also come before the subcommand; each subcommand has its own --help. "
+               "Paths are share-relative, /<share>/<folder>. Exit status: 0 success, 1 a library call failed, "
+               "2 wrong command line, 3 a path may not be indexed, 4 no such share, path or folder, 5 fileindexd "
+               "was not told, 75 a lock stayed busy, 130 interrupted.");
 
     Context context;
     app.add_flag("--json", context.json, "print one JSON document (docs/fileindexctl.md gives each shape)");
-    AddWaitOption(app, context);
+    AddWaitOption(app, context,
+                  "for folder get/add/set/remove, share remove/rename/revive, pause and resume, which take their "
+                  "lock before they do anything: while another program holds it, try again for up to this many "
+                  "seconds (0: give up at once); a lock still busy then exits 75. The others take no lock of their "
+                  "own, or may have done part of their work when they meet one, and fail at once");
     AddFolderCommands(app, context);
     AddIndexCommands(app, context);
     AddStatusCommands(app, context);
     AddShareCommands(app, context);
+    AddCompleteCommand(app, context);
 
     context.json = std::any_of(argv + 1, argv + argc, [](const char *arg) { return strcmp(arg, "--json") == 0; });
     const std::string unknown = UnknownCommand(app, argc, argv);
