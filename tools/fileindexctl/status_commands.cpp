@@ -63,11 +63,7 @@ int Status(const Context &context, StatusOptions &options)
     if (context.json) {
         PrintJson(fileindex_tool::StatusRecord(report));
     } else {
-        for (const std::vector<std::string> &lines : {SummaryLines(report), FolderLines(report)}) {
-            for (const std::string &line : lines) {
-                std::cout << line << "\n";
-            }
-        }
+        PrintStatus(report);
     }
     return kSuccess;
 }

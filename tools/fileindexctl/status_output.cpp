@@ -2,6 +2,7 @@
 #include "status_output.h"
 
 #include <ctime>
+#include <iostream>
 #include <sstream>
 
 #include "output.h"
@@ -11,16 +12,18 @@ namespace fileindexctl {
 
 using fileindex_tool::StatusReport;
 
-std::string PauseText(long long resumeTime)
+std::string LocalTime(long long when, const char *format)
 {
-    if (resumeTime == 0) {
-        return "until resumed";
-    }
-    const time_t when = static_cast<time_t>(resumeTime);
+    const time_t time = static_cast<time_t>(when);
     char text[64];
     struct tm local;
-    strftime(text, sizeof(text), "%Y-%m-%d %H:%M:%S %Z", localtime_r(&when, &local));
-    return std::string("until ") + text;
+    strftime(text, sizeof(text), format, localtime_r(&time, &local));
+    return text;
+}
+
+std::string PauseText(long long resumeTime)
+{
+    return resumeTime == 0 ? "until resumed" : "until " + LocalTime(resumeTime, "%Y-%m-%d %H:%M:%S %Z");
 }
 
 std::vector<std::string> SummaryLines(const StatusReport &report)
@@ -68,6 +71,15 @@ std::vector<std::string> FolderLines(const StatusReport &report)
         lines.push_back(line);
     }
     return lines;
+}
+
+void PrintStatus(const StatusReport &report)
+{
+    for (const std::vector<std::string> &lines : {SummaryLines(report), FolderLines(report)}) {
+        for (const std::string &line : lines) {
+            std::cout << line << "\n";
+        }
+    }
 }
 
 }  // namespace fileindexctl

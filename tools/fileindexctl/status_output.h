@@ -10,6 +10,8 @@
 
 namespace fileindexctl {
 
+// The local time of when in strftime's format.
+std::string LocalTime(long long when, const char *format);
 // "until resumed", or "until <local time>" for a timed pause.
 std::string PauseText(long long resumeTime);
 
@@ -18,6 +20,9 @@ std::string PauseText(long long resumeTime);
 std::vector<std::string> SummaryLines(const fileindex_tool::StatusReport &report);
 // The folder table, header first; none without folders.
 std::vector<std::string> FolderLines(const fileindex_tool::StatusReport &report);
+
+// The summary and the folder table on standard output.
+void PrintStatus(const fileindex_tool::StatusReport &report);
 
 // status --watch: takes a report of paths (every folder when empty) every interval seconds until
 // indexing has finished (status 0) or SIGINT/SIGTERM (130). On a terminal whose TERM is not "dumb"

@@ -5,6 +5,7 @@
 
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <iostream>
 
 #include "failure.h"
@@ -61,22 +62,6 @@ std::vector<std::string> FitToWindow(const StatusReport &report, size_t rows)
     return lines;
 }
 
-void Print(const std::vector<std::string> &lines)
-{
-    for (const std::string &line : lines) {
-        std::cout << line << "\n";
-    }
-}
-
-std::string Now()
-{
-    const time_t now = time(nullptr);
-    struct tm local;
-    char text[16];
-    strftime(text, sizeof(text), "%H:%M:%S", localtime_r(&now, &local));
-    return text;
-}
-
 }  // namespace
 
 int Watch(const Context &context, const std::vector<std::string> &paths, double interval)
@@ -114,7 +99,7 @@ int Watch(const Context &context, const std::vector<std::string> &paths, double 
                 summary += (summary.empty() ? "" : "; ") + line;
             }
             if (summary != shownSummary) {
-                std::cout << Now() << " " << summary << std::endl;
+                std::cout << LocalTime(time(nullptr), "%H:%M:%S") << " " << summary << std::endl;
                 shownSummary = summary;
             }
         }
@@ -135,8 +120,7 @@ int Watch(const Context &context, const std::vector<std::string> &paths, double 
             PrintJson(fileindex_tool::StatusRecord(report));
         }
     } else {
-        Print(SummaryLines(report));
-        Print(FolderLines(report));
+        PrintStatus(report);
     }
     std::cout << std::flush;
     return status;
