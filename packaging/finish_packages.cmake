@@ -4,18 +4,22 @@
 #   shared library, which call ldconfig themselves;
 # - a -dbgsym package gets md5sums of its own files (cpack's name the files where it staged them)
 #   and, as Debian's do, its doc directory as a link to that of the package whose binaries it
-#   belongs to, which it depends on.
-# Each package changed is unpacked and built again with dpkg-deb.
+#   belongs to, which it depends on;
+# - every package's Installed-Size is that of its files as shipped: cpack measures them before it
+#   moves the debugging information out.
+# Each package is unpacked and built again with dpkg-deb.
+cmake_minimum_required(VERSION 3.22)
 list(GET CPACK_PACKAGE_FILES 0 _first)
 get_filename_component(_directory ${_first} DIRECTORY)
 file(GLOB _packages ${_directory}/*.deb ${_directory}/*.ddeb)
+set(_tree ${_directory}/finishing)
 
 foreach(_package_file IN LISTS _packages)
-  set(_tree ${_directory}/finishing)
   file(REMOVE_RECURSE ${_tree})
   execute_process(COMMAND dpkg-deb --raw-extract ${_package_file} ${_tree} COMMAND_ERROR_IS_FATAL ANY)
-  file(STRINGS ${_tree}/DEBIAN/control _name REGEX "^Package: ")
-  string(REPLACE "Package: " "" _name "${_name}")
+  file(READ ${_tree}/DEBIAN/control _control)
+  string(REGEX MATCH "(^|\n)Package: ([^\n]*)" _ ${_control})
+  set(_name ${CMAKE_MATCH_2})
 
   if(EXISTS ${_tree}/DEBIAN/triggers)
     file(REMOVE ${_tree}/DEBIAN/postinst ${_tree}/DEBIAN/postrm)
@@ -30,10 +34,24 @@ foreach(_package_file IN LISTS _packages)
       string(APPEND _sums "${_sum}  ${_file}\n")
     endforeach()
     file(WRITE ${_tree}/DEBIAN/md5sums "${_sums}")
-  else()
-    continue()
   endif()
+
+  # As dpkg-gencontrol counts: each file's size in KiB rounded up, and 1 for every other entry.
+  file(GLOB_RECURSE _entries LIST_DIRECTORIES true ${_tree}/*)
+  list(FILTER _entries EXCLUDE REGEX "^${_tree}/DEBIAN(/|$)")
+  set(_size 0)
+  foreach(_entry IN LISTS _entries)
+    if(IS_SYMLINK ${_entry} OR IS_DIRECTORY ${_entry})
+      math(EXPR _size "${_size} + 1")
+    else()
+      file(SIZE ${_entry} _bytes)
+      math(EXPR _size "${_size} + (${_bytes} + 1023) / 1024")
+    endif()
+  endforeach()
+  string(REGEX REPLACE "Installed-Size: [0-9]+" "Installed-Size: ${_size}" _control "${_control}")
+  file(WRITE ${_tree}/DEBIAN/control "${_control}")
+
   execute_process(COMMAND dpkg-deb --root-owner-group --build ${_tree} ${_package_file}
                   OUTPUT_QUIET COMMAND_ERROR_IS_FATAL ANY)
 endforeach()
-file(REMOVE_RECURSE ${_directory}/finishing)
+file(REMOVE_RECURSE ${_tree})
