@@ -116,7 +116,7 @@ run fileindexctl status /music
 run cat notifications.log
 
 step "Space is freed: revive the share and let the daemon finish"
-run_sh "sed -i '/VEXOQuotaIsEnough/d' emulation/faults.json"
+run_sh "sed -i 's#^{\"VEXOQuotaIsEnough\".*#{#' emulation/faults.json"
 run fileindexctl share revive music
 run fileindexctl status --watch --interval 0.2
 

@@ -235,7 +235,8 @@ function showStatus(status) {
   const overall = $('overall');
   overall.dataset.state = status.status;
   overall.textContent = kStateWords[status.status] || status.status;
-  $('paused').hidden = status.resume_time === -1;
+  // The overall word already says "paused" while paused work waits; the badge says it otherwise.
+  $('paused').hidden = status.resume_time === -1 || status.status === 'paused';
   $('pause-text').textContent = pauseText(status.resume_time);
   $('resume').disabled = status.resume_time === -1;
   const daemon = $('daemon');
