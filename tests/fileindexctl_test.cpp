@@ -143,6 +143,7 @@ TEST_F(FileindexctlTest, AFailedCallPrintsOneLineNamingItsErrorCode)
         {{"folder", "add", "/photo/nonexistent"}, 4,
          "folder add: /photo/nonexistent does not exist; .* \\(FILEIDX_ERR_PATH\\)"},
         {{"status", "/nosuch"}, 4, "status: " + noShare + " \\(FILEIDX_ERR_PATH\\)"},
+        {{"status", "/music"}, 4, "status: /music is not an indexed folder, nor inside or above one; .*"},
         {{"reindex", "/photo/nonexistent"}, 4, "reindex: /photo/nonexistent does not exist; .*"},
         {{"reindex", "/music"}, 4,
          "reindex: /music is not an indexed folder, nor inside or above one; .* \\(FILEIDX_ERR_NO_SUCH_FOLDER\\)"},

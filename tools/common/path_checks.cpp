@@ -7,6 +7,7 @@
 #include <cerrno>
 
 #include "fileindex/error.h"
+#include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
 #include "path_encoding.h"
 
@@ -116,6 +117,16 @@ bool CheckShareKnown(const std::string &what, const std::string &share, const st
                           "the share database has no share of that name";
     }
     return false;
+}
+
+bool CheckIndexedOrAbove(const std::string &what, const std::string &path, Failure &failure)
+{
+    if (IndexMgr::IsPathIndexed(path) || IndexMgr::IsPathContainIndexed(path)) {
+        return true;
+    }
+    return Refuse(failure, FailureKind::kNotFound, FILEIDX_ERR_NO_SUCH_FOLDER,
+                  what + ": " + TerminalText(path) + " is not an indexed folder, nor inside or above one; the folder "
+                  "list shows the indexed folders");
 }
 
 Failure NotInFolderList(const std::string &what, const std::string &path)

@@ -33,6 +33,11 @@ bool CheckPathExists(const std::string &what, const std::string &path, Failure &
 bool CheckShareKnown(const std::string &what, const std::string &share,
                      const std::vector<VEXO::FILEINDEX::Folder> &folders, Failure &failure);
 
+// The path is an indexed folder, lies inside one or holds one (IndexMgr::IsPathIndexed or
+// IsPathContainIndexed; folder.conf read without its lock). Refused: kNotFound, code 4, "<path> is not
+// an indexed folder, nor inside or above one".
+bool CheckIndexedOrAbove(const std::string &what, const std::string &path, Failure &failure);
+
 // A path that is not in the folder list: kNotFound, code 4, "<path> is not in the folder list".
 Failure NotInFolderList(const std::string &what, const std::string &path);
 

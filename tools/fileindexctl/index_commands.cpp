@@ -7,7 +7,6 @@
 #include "check_report.h"
 #include "commands.h"
 #include "failure.h"
-#include "fileindex/error.h"
 #include "fileindex/index_mgr.h"
 #include "fileindex/utils.h"
 #include "folder_output.h"
@@ -78,14 +77,9 @@ int Reindex(const Context &context, std::vector<std::string> &paths)
         return Report(context, failure);
     }
     for (const std::string &path : paths) {
-        if (!fileindex_tool::CheckPathExists("reindex", path, failure)) {
+        if (!fileindex_tool::CheckPathExists("reindex", path, failure) ||
+            !fileindex_tool::CheckIndexedOrAbove("reindex", path, failure)) {
             return Report(context, failure);
-        }
-        if (!IndexMgr::IsPathIndexed(path) && !IndexMgr::IsPathContainIndexed(path)) {
-            return Report(context, fileindex_tool::ToolFailure(
-                                       fileindex_tool::FailureKind::kNotFound, FILEIDX_ERR_NO_SUCH_FOLDER,
-                                       "reindex: " + TerminalText(path) + " is not an indexed folder, nor inside or "
-                                       "above one; the folder list shows the indexed folders"));
         }
     }
     const Json::Value request = PathArray(paths);

@@ -48,7 +48,8 @@ int Status(const Context &context, StatusOptions &options)
         return Report(context, failure);
     }
     for (const std::string &path : options.paths) {
-        if (!fileindex_tool::CheckPathExists("status", path, failure)) {
+        if (!fileindex_tool::CheckPathExists("status", path, failure) ||
+            !fileindex_tool::CheckIndexedOrAbove("status", path, failure)) {
             return Report(context, failure);
         }
     }
