@@ -38,6 +38,10 @@ enum class JsonToken { kString, kNumber, kTrue, kFalse, kNull, kObject, kArray }
 template <typename Observer>
 bool ScanJsonText(const char *text, size_t length, Observer &observer);
 
+// The first byte in [p, end) that ends the plain run of a string's bytes, a quote, a backslash or a
+// control character; end when there is none. Sixteen or eight bytes are looked at at a time.
+inline const char *SkipPlainStringBytes(const char *p, const char *end);
+
 // ---- Implementation ----
 
 namespace json_grammar_detail {
@@ -55,6 +59,59 @@ struct StringStops {
     }
 };
 constexpr StringStops kStringStops;
+
+// The high bit of each byte of word that is a quote, a backslash or a control character (the usual
+// test for a zero byte, made on the byte xor '"', on it xor '\\', and on it less 0x20). Bytes above
+// the first such byte may be marked wrongly; the first one never is.
+inline uint64_t StringStopBytes(uint64_t word)
+{
+    constexpr uint64_t kOnes = 0x0101010101010101ULL;
+    constexpr uint64_t kHighs = 0x8080808080808080ULL;
+    const uint64_t quote = word ^ (kOnes * '"');
+    const uint64_t backslash = word ^ (kOnes * '\\');
+    const uint64_t zeroQuote = (quote - kOnes) & ~quote;
+    const uint64_t zeroBackslash = (backslash - kOnes) & ~backslash;
+    const uint64_t control = (word - kOnes * 0x20) & ~word;
+    return (zeroQuote | zeroBackslash | control) & kHighs;
+}
+
+}  // namespace json_grammar_detail
+
+inline const char *SkipPlainStringBytes(const char *p, const char *end)
+{
+#if defined(__SSE2__)
+    const __m128i quote = _mm_set1_epi8('"');
+    const __m128i backslash = _mm_set1_epi8('\\');
+    const __m128i lastControl = _mm_set1_epi8(0x1F);
+    for (; end - p >= 16; p += 16) {
+        const __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p));
+        const __m128i control = _mm_cmpeq_epi8(_mm_max_epu8(bytes, lastControl), lastControl);
+        const __m128i stops = _mm_or_si128(_mm_or_si128(_mm_cmpeq_epi8(bytes, quote), _mm_cmpeq_epi8(bytes, backslash)), control);
+        const int mask = _mm_movemask_epi8(stops);
+        if (mask != 0) {
+            return p + __builtin_ctz(static_cast<unsigned>(mask));
+        }
+    }
+#endif
+    for (; end - p >= 8; p += 8) {
+        uint64_t word;
+        std::memcpy(&word, p, sizeof(word));
+        const uint64_t stops = json_grammar_detail::StringStopBytes(word);
+        if (stops != 0) {
+#if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+            return p + (__builtin_ctzll(stops) >> 3);  // the first byte of the word in memory
+#else
+            break;
+#endif
+        }
+    }
+    while (p != end && !json_grammar_detail::kStringStops.stop[static_cast<unsigned char>(*p)]) {
+        ++p;
+    }
+    return p;
+}
+
+namespace json_grammar_detail {
 
 template <typename Observer>
 class Scan {
@@ -191,58 +248,7 @@ private:
         return true;
     }
 
-    // Moves past bytes that need no attention inside a string, eight at a time where it can.
-    void SkipPlainBytes()
-    {
-        const char *p = m_pos;
-#if defined(__SSE2__)
-        const __m128i quote = _mm_set1_epi8('"');
-        const __m128i backslash = _mm_set1_epi8('\\');
-        const __m128i lastControl = _mm_set1_epi8(0x1F);
-        for (; m_end - p >= 16; p += 16) {
-            const __m128i bytes = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p));
-            const __m128i control = _mm_cmpeq_epi8(_mm_max_epu8(bytes, lastControl), lastControl);
-            const __m128i stops = _mm_or_si128(_mm_or_si128(_mm_cmpeq_epi8(bytes, quote), _mm_cmpeq_epi8(bytes, backslash)), control);
-            const int mask = _mm_movemask_epi8(stops);
-            if (mask != 0) {
-                m_pos = p + __builtin_ctz(static_cast<unsigned>(mask));
-                return;
-            }
-        }
-#endif
-        for (; m_end - p >= 8; p += 8) {
-            uint64_t word;
-            std::memcpy(&word, p, sizeof(word));
-            const uint64_t stops = StopBytes(word);
-            if (stops != 0) {
-#if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
-                m_pos = p + (__builtin_ctzll(stops) >> 3);  // the first byte of the word in memory
-                return;
-#else
-                break;
-#endif
-            }
-        }
-        while (p != m_end && !kStringStops.stop[static_cast<unsigned char>(*p)]) {
-            ++p;
-        }
-        m_pos = p;
-    }
-
-    // The high bit of each byte of word that is a quote, a backslash or a control character (the
-    // usual test for a zero byte, made on the byte xor '"', on it xor '\\', and on it less 0x20).
-    // Bytes above the first such byte may be marked wrongly; the first one never is.
-    static uint64_t StopBytes(uint64_t word)
-    {
-        constexpr uint64_t kOnes = 0x0101010101010101ULL;
-        constexpr uint64_t kHighs = 0x8080808080808080ULL;
-        const uint64_t quote = word ^ (kOnes * '"');
-        const uint64_t backslash = word ^ (kOnes * '\\');
-        const uint64_t zeroQuote = (quote - kOnes) & ~quote;
-        const uint64_t zeroBackslash = (backslash - kOnes) & ~backslash;
-        const uint64_t control = (word - kOnes * 0x20) & ~word;
-        return (zeroQuote | zeroBackslash | control) & kHighs;
-    }
+    void SkipPlainBytes() { m_pos = SkipPlainStringBytes(m_pos, m_end); }
 
     // Reads the four hex digits of a \u escape into unit.
     bool HexQuad(unsigned &unit)

@@ -1,6 +1,7 @@
 // One queue line judged straight from its text, and the same judgement through the JSON library.
 #include "daemon/queue_record.h"
 
+#include <cstdint>
 #include <cstring>
 
 #include <json/value.h>
@@ -110,10 +111,77 @@ private:
     MemberText *m_current = nullptr;
 };
 
+// Whether line holds text at pos, compared as a run of bytes of the text's fixed length.
+template <size_t N>
+bool HasAt(std::string_view line, size_t pos, const char (&text)[N])
+{
+    return line.size() >= pos + N - 1 && std::memcmp(line.data() + pos, text, N - 1) == 0;
+}
+
+// The end of a string's plain bytes that starts at begin: the position of its closing quote, or
+// npos when a backslash, a control character or the end of the line comes first.
+size_t PlainStringEnd(std::string_view line, size_t begin)
+{
+    const char *const end = line.data() + line.size();
+    const char *const stop = SkipPlainStringBytes(line.data() + begin, end);
+    return stop != end && *stop == '"' ? static_cast<size_t>(stop - line.data()) : std::string_view::npos;
+}
+
+// The shape nearly every record has, {"event":N,"path":"P"} with ,"path_old":"Q" before the brace
+// for a move, with no white space, no escape and no control character, and N a plain integer up to
+// 4294967295: judged without the grammar walk, with the walk's very result. False for any other
+// line, which may still be a record.
+bool ParsePlainRecord(std::string_view line, QueueRecord &record)
+{
+    static const char kEvent[] = "{\"event\":";
+    static const char kPath[] = ",\"path\":\"";
+    static const char kPathOld[] = ",\"path_old\":\"";
+    if (!HasAt(line, 0, kEvent)) {
+        return false;
+    }
+    size_t pos = sizeof(kEvent) - 1;
+    const size_t digits = pos;
+    uint64_t event = 0;
+    for (; pos < line.size() && line[pos] >= '0' && line[pos] <= '9' && pos - digits < 11; ++pos) {
+        event = event * 10 + static_cast<uint64_t>(line[pos] - '0');
+    }
+    const size_t count = pos - digits;
+    if (count == 0 || count > 10 || (count > 1 && line[digits] == '0') || event > 0xFFFFFFFFULL ||
+        !HasAt(line, pos, kPath)) {
+        return false;
+    }
+    const size_t path = pos + sizeof(kPath) - 1;
+    const size_t pathEnd = PlainStringEnd(line, path);
+    if (pathEnd == std::string_view::npos) {
+        return false;
+    }
+    pos = pathEnd + 1;
+    size_t pathOld = pos;
+    size_t pathOldEnd = pos;
+    if (HasAt(line, pos, kPathOld)) {
+        pathOld = pos + sizeof(kPathOld) - 1;
+        pathOldEnd = PlainStringEnd(line, pathOld);
+        if (pathOldEnd == std::string_view::npos) {
+            return false;
+        }
+        pos = pathOldEnd + 1;
+    }
+    if (pos + 1 != line.size() || line[pos] != '}') {
+        return false;
+    }
+    record.event = static_cast<unsigned>(event);
+    record.path.assign(line.data() + path, pathEnd - path);
+    record.pathOld.assign(line.data() + pathOld, record.event == kEventMove ? pathOldEnd - pathOld : 0);
+    return true;
+}
+
 }  // namespace
 
 bool ParseQueueRecord(std::string_view line, QueueRecord &record)
 {
+    if (ParsePlainRecord(line, record)) {
+        return true;
+    }
     RecordMembers members;
     if (!ScanJsonText(line.data(), line.size(), members)) {
         return false;  // fromString refuses what the grammar refuses

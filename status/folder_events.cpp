@@ -29,46 +29,31 @@ uint64_t Tail(const char *text, size_t length)
     return word ^ (length * 0x9E3779B97F4A7C15ULL);
 }
 
-// Counts of folders by the Tail of their text, in a table of a power-of-two size probed in line.
+// Counts of the folders still waiting for their first event, by a hash of the Tail of their text
+// into at least sixteen buckets per folder: an event in a folder that has had its first one is
+// passed over after one look at its bucket, without hashing the whole path.
 class WaitingTails {
 public:
     explicit WaitingTails(const std::vector<std::string> &folders)
     {
-        while (m_slots.size() < 2 * folders.size()) {
-            m_slots.resize(m_slots.size() * 2);
+        while (m_counts.size() < 16 * folders.size()) {
+            m_counts.resize(m_counts.size() * 2);
             --m_shift;
         }
         for (const std::string &folder : folders) {
-            const uint64_t tail = Tail(folder.data(), folder.size());
-            size_t i = Home(tail);
-            while (m_slots[i].used && m_slots[i].tail != tail) {
-                i = (i + 1) & (m_slots.size() - 1);
-            }
-            m_slots[i] = Slot{true, tail, m_slots[i].count + 1};
+            ++m_counts[Bucket(Tail(folder.data(), folder.size()))];
         }
     }
 
-    // The count for tail; null when no folder has it.
-    size_t *Find(uint64_t tail)
-    {
-        for (size_t i = Home(tail); m_slots[i].used; i = (i + 1) & (m_slots.size() - 1)) {
-            if (m_slots[i].tail == tail) {
-                return &m_slots[i].count;
-            }
-        }
-        return nullptr;
-    }
+    // False when no waiting folder has this tail; true when one may have.
+    bool AnyWaiting(uint64_t tail) const { return m_counts[Bucket(tail)] != 0; }
+    // A folder with this tail has had its first event.
+    void Settle(uint64_t tail) { --m_counts[Bucket(tail)]; }
 
 private:
-    struct Slot {
-        bool used = false;
-        uint64_t tail = 0;
-        size_t count = 0;
-    };
+    size_t Bucket(uint64_t tail) const { return static_cast<size_t>((tail * 0x9E3779B97F4A7C15ULL) >> m_shift); }
 
-    size_t Home(uint64_t tail) const { return static_cast<size_t>((tail * 0x9E3779B97F4A7C15ULL) >> m_shift); }
-
-    std::vector<Slot> m_slots = std::vector<Slot>(2);
+    std::vector<uint32_t> m_counts = std::vector<uint32_t>(2);
     int m_shift = 63;
 };
 
@@ -158,15 +143,15 @@ private:
                 if (length < path.size() && path[length] != '/') {
                     continue;
                 }
-                size_t *const tailCount = waitingTails.Find(Tail(path.data(), length));
-                if (tailCount == nullptr || *tailCount == 0) {
+                const uint64_t tail = Tail(path.data(), length);
+                if (!waitingTails.AnyWaiting(tail)) {
                     continue;
                 }
                 const auto folder = m_index.find(std::string_view(path.data(), length));
                 if (folder != m_index.end() && reading.firstEvent[folder->second] == kNoEvent) {
                     reading.firstEvent[folder->second] = number;
                     --waiting;
-                    --*tailCount;
+                    waitingTails.Settle(tail);
                 }
             }
         };

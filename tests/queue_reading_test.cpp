@@ -32,6 +32,8 @@ TEST(QueueLineTest, TextReaderJudgesEveryLineAsTheJsonLibraryDoes)
         {R"({"event":65536,"path":"/v/a"})", true, 65536, "/v/a", ""},
         {R"( { "event" : 256 , "path":"/v/b", "path_old":"/v/a" } )", true, 256, "/v/b", "/v/a"},
         {R"({"event":2,"path":"/v/b","path_old":"/v/a"})", true, 2, "/v/b", ""},
+        {R"({"event":256,"path":"/v/b","path_old":"/v/a"})", true, 256, "/v/b", "/v/a"},
+        {"{\"event\":0,\"path\":\"\"}\r", true, 0, "", ""},
         {R"({"event":256,"path":"/v/b","path_old":7})", true, 256, "/v/b", ""},
         {R"({"event":6.5536e4,"path":"/v/a"})", true, 65536, "/v/a", ""},
         {R"({"event":65536.9,"path":"/v/a"})", true, 65536, "/v/a", ""},
