@@ -127,7 +127,7 @@ size_t PlainStringEnd(std::string_view line, size_t begin)
     return stop != end && *stop == '"' ? static_cast<size_t>(stop - line.data()) : std::string_view::npos;
 }
 
-// The shape nearly every record has, {"event":N,"path":"P"} with ,"path_old":"Q" before the brace
+// The compact shape of a file event, {"event":N,"path":"P"} with ,"path_old":"Q" before the brace
 // for a move, with no white space, no escape and no control character, and N a plain integer up to
 // 4294967295: judged without the grammar walk, with the walk's very result. False for any other
 // line, which may still be a record.

@@ -27,9 +27,9 @@ struct QueueRecord {
 // True when line is one JSON object (fromString) with an "event" the JSON library can convert to an
 // unsigned integer and a string "path"; record is then filled. False for anything else (a line
 // being appended, a foreign record), record unspecified. Reads the members straight from the
-// text, the compact shape the writers use ({"event":N,"path":"P"}, plus "path_old" for a move)
-// without even walking the grammar, and hands the rare line whose judgement needs the JSON library
-// to ParseQueueRecordAsJsonValue.
+// text, a file event's compact shape ({"event":N,"path":"P"}, plus "path_old" for a move) without
+// even walking the grammar, and hands the rare line whose judgement needs the JSON library to
+// ParseQueueRecordAsJsonValue.
 bool ParseQueueRecord(std::string_view line, QueueRecord &record);
 
 // The same judgement made on the line's Json::Value.

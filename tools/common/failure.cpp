@@ -32,9 +32,9 @@ const ErrorText kErrorTexts[] = {
      "the folder list shows the indexed folders"},
     {5, "FILEIDX_ERR_EXCEED_MAX_FOLDER", FailureKind::kFailed, "the folder list already holds 1000 folders",
      "remove folders before adding more"},
-    {6, "FILEIDX_ERR_LOAD_CONFIG", FailureKind::kFailed, "folder.conf or status.conf exists but cannot be read or "
-                                                         "parsed",
-     "the system log names the file; repair or remove it"},
+    {6, "FILEIDX_ERR_LOAD_CONFIG", FailureKind::kFailed,
+     "folder.conf or status.conf exists but cannot be read or parsed, or a member of status.conf has the wrong type",
+     "the system log names the file, or says \"json exception\" for a member of status.conf; repair or remove it"},
     {7, "FILEIDX_ERR_SAVE_CONFIG", FailureKind::kFailed, "folder.conf or status.conf could not be written",
      "check free space and permissions of the configuration directory"},
     {8, "FILEIDX_ERR_MALFORMED_CONFIG", FailureKind::kFailed, "folder.conf is not a JSON object",
