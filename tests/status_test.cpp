@@ -349,6 +349,7 @@ TEST_F(ProgressTest, PendingWorkReadsAsThePauseStateAllows)
         {R"({"resume_time":)" + std::to_string(now - 1) + "}", "processing", "processing"},
         {R"({"resume_time":"abc"})", "processing", nullptr},
         {R"({"no_space":{"photo":true}})", "err_no_space", "processing"},
+        {R"({"resume_time":0,"no_space":[],"one":"x"})", "paused", "paused"},  // marks of the wrong type
     };
     WriteQueue("photo", "half a line\n" + Record(1, "/volume1/photo/folder/a"));
     for (const auto &c : cases) {
