@@ -1,8 +1,6 @@
 // The tools' encodings of byte strings: JSON "path"/"path_bytes", percent-encoding, terminal quoting.
 #include "path_encoding.h"
 
-#include <cstdio>
-
 namespace fileindex_tool {
 
 namespace {
@@ -43,11 +41,14 @@ size_t SequenceLength(const std::string &bytes, size_t at)
     return length;
 }
 
-std::string HexByte(const char *format, unsigned char byte)
+// Appends the byte as prefix and two hex digits (upper or lower case), without formatting calls:
+// every folder record of a page encodes two paths this way.
+void AppendHexByte(std::string &text, const char *prefix, unsigned char byte, bool upper)
 {
-    char text[5];
-    snprintf(text, sizeof(text), format, byte);
-    return text;
+    const char *digits = upper ? "0123456789ABCDEF" : "0123456789abcdef";
+    text += prefix;
+    text += digits[byte >> 4];
+    text += digits[byte & 0x0F];
 }
 
 bool IsUnreserved(unsigned char byte)
@@ -79,19 +80,19 @@ bool IsControlAt(const std::string &bytes, size_t at)
            (lead == 0xC2 && at + 1 < bytes.size() && static_cast<unsigned char>(bytes[at + 1]) < 0xA0);
 }
 
-// The shell escape of one control byte inside $'...'.
-std::string ControlEscape(unsigned char byte)
+// Appends the shell escape of one control byte inside $'...'.
+void AppendControlEscape(std::string &text, unsigned char byte)
 {
     switch (byte) {
-    case '\a': return "\\a";
-    case '\b': return "\\b";
-    case '\t': return "\\t";
-    case '\n': return "\\n";
-    case '\v': return "\\v";
-    case '\f': return "\\f";
-    case '\r': return "\\r";
-    case 0x1B: return "\\e";
-    default: return HexByte("\\x%02x", byte);
+    case '\a': text += "\\a"; break;
+    case '\b': text += "\\b"; break;
+    case '\t': text += "\\t"; break;
+    case '\n': text += "\\n"; break;
+    case '\v': text += "\\v"; break;
+    case '\f': text += "\\f"; break;
+    case '\r': text += "\\r"; break;
+    case 0x1B: text += "\\e"; break;
+    default: AppendHexByte(text, "\\x", byte, false);
     }
 }
 
@@ -113,16 +114,18 @@ std::string DisplayText(const std::string &bytes)
 {
     std::string text;
     text.reserve(bytes.size());
+    size_t copied = 0;  // bytes before this are in text already
     for (size_t at = 0; at < bytes.size();) {
         const size_t length = SequenceLength(bytes, at);
-        if (length == 0) {
-            text += HexByte("\\x%02x", static_cast<unsigned char>(bytes[at]));
-            ++at;
-        } else {
-            text.append(bytes, at, length);
+        if (length != 0) {
             at += length;
+            continue;
         }
+        text.append(bytes, copied, at - copied);
+        AppendHexByte(text, "\\x", static_cast<unsigned char>(bytes[at]), false);
+        copied = ++at;
     }
+    text.append(bytes, copied, std::string::npos);
     return text;
 }
 
@@ -132,7 +135,11 @@ std::string PercentEncode(const std::string &bytes)
     text.reserve(bytes.size());
     for (const char c : bytes) {
         const auto byte = static_cast<unsigned char>(c);
-        text += IsUnreserved(byte) ? std::string(1, c) : HexByte("%%%02X", byte);
+        if (IsUnreserved(byte)) {
+            text += c;
+        } else {
+            AppendHexByte(text, "%", byte, true);
+        }
     }
     return text;
 }
@@ -177,11 +184,11 @@ std::string TerminalText(const std::string &bytes)
         const size_t length = SequenceLength(bytes, at);
         const auto byte = static_cast<unsigned char>(bytes[at]);
         if (length == 0) {
-            text += HexByte("\\x%02x", byte);
+            AppendHexByte(text, "\\x", byte, false);
             ++at;
         } else if (IsControlAt(bytes, at)) {
             for (size_t i = 0; i < length; ++i) {
-                text += ControlEscape(static_cast<unsigned char>(bytes[at + i]));
+                AppendControlEscape(text, static_cast<unsigned char>(bytes[at + i]));
             }
             at += length;
         } else if (byte == '\\' || byte == '\'') {

@@ -32,19 +32,37 @@ public:
     }
 };
 
+// Makes a library record the tool's folder record in place, so that a page of 1000 folders is
+// answered without building a second tree of records. Members a folder record does not have are
+// removed.
+void MakeFolderRecord(Json::Value &record)
+{
+    static const std::set<std::string> kKept = {"path", "name", "document", "audio", "video", "photo", "additional"};
+    std::vector<std::string> others;
+    for (auto member = record.begin(); member != record.end(); ++member) {
+        if (kKept.count(member.name()) == 0) {
+            others.push_back(member.name());
+        }
+    }
+    for (const std::string &other : others) {
+        record.removeMember(other);
+    }
+    for (const char *name : {"path", "name"}) {
+        const std::string bytes = record[name].asString();
+        SetBytesMember(record, name, bytes);
+    }
+    for (const char *kind : {"document", "audio", "video", "photo"}) {
+        Json::Value &flag = record[kind];
+        flag = flag.isBool() && flag.asBool();
+    }
+}
+
 }  // namespace
 
 Json::Value FolderRecord(const Json::Value &libraryRecord)
 {
-    Json::Value record(Json::objectValue);
-    SetBytesMember(record, "path", libraryRecord["path"].asString());
-    SetBytesMember(record, "name", libraryRecord["name"].asString());
-    for (const char *kind : {"document", "audio", "video", "photo"}) {
-        record[kind] = libraryRecord[kind].isBool() && libraryRecord[kind].asBool();
-    }
-    if (libraryRecord.isMember("additional")) {
-        record["additional"] = libraryRecord["additional"];
-    }
+    Json::Value record = libraryRecord.isObject() ? libraryRecord : Json::Value(Json::objectValue);
+    MakeFolderRecord(record);
     return record;
 }
 
@@ -52,19 +70,23 @@ Json::Value FolderRecords(const std::vector<Folder> &folders)
 {
     Json::Value records(Json::arrayValue);
     for (const Folder &folder : folders) {
-        records.append(FolderRecord(folder.asJson()));
+        records.append(folder.asJson());
+        MakeFolderRecord(records[records.size() - 1]);
     }
     return records;
 }
 
-Json::Value FolderPage(const Json::Value &libraryPage)
+Json::Value FolderPage(Json::Value libraryPage)
 {
     Json::Value page;
     page["total"] = libraryPage["total"];
     page["offset"] = libraryPage["offset"];
     page["folders"] = Json::Value(Json::arrayValue);
-    for (const Json::Value &record : libraryPage["folder"]) {
-        page["folders"].append(FolderRecord(record));
+    if (libraryPage["folder"].isArray()) {
+        page["folders"].swap(libraryPage["folder"]);
+    }
+    for (Json::Value &record : page["folders"]) {
+        MakeFolderRecord(record);
     }
     return page;
 }

@@ -20,8 +20,9 @@ namespace fileindex_tool {
 Json::Value FolderRecord(const Json::Value &libraryRecord);
 // FolderRecord of each folder, in the vector's order.
 Json::Value FolderRecords(const std::vector<VEXO::FILEINDEX::Folder> &folders);
-// A page of IndexMgr::List: {"total", "offset", "folders": [FolderRecord...]}.
-Json::Value FolderPage(const Json::Value &libraryPage);
+// A page of IndexMgr::List: {"total", "offset", "folders": [FolderRecord...]}. Takes the page, so
+// that a caller done with it can move it in rather than have it copied.
+Json::Value FolderPage(Json::Value libraryPage);
 
 // The folders whose paths are among paths, in list order.
 std::vector<VEXO::FILEINDEX::Folder> FoldersAt(const std::vector<VEXO::FILEINDEX::Folder> &folders,

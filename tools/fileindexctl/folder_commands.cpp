@@ -215,7 +215,7 @@ int List(const Context &context, const ListOptions &options)
         return Report(context, LibraryFailure("folder list", kReadHint));
     }
     if (context.json) {
-        PrintJson(fileindex_tool::FolderPage(page));
+        PrintJson(fileindex_tool::FolderPage(std::move(page)));
         return kSuccess;
     }
     std::vector<std::string> header{"PATH", "NAME", "MEDIA"};

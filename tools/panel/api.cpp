@@ -151,7 +151,7 @@ void GetFolders(const httplib::Request &request, httplib::Response &response)
         },
         failure);
     if (listed) {
-        Send(response, fileindex_tool::FolderPage(page));
+        Send(response, fileindex_tool::FolderPage(std::move(page)));
     } else {
         SendFailure(response, failure);
     }

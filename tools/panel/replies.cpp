@@ -9,11 +9,14 @@ namespace fileindex_panel {
 
 namespace {
 
+// Without comment handling: requests are parsed without comments, so no document the panel writes
+// carries any, and the writer is spared looking for them at every value.
 std::string CompactJson(const Json::Value &document)
 {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
     builder["emitUTF8"] = true;
+    builder["commentStyle"] = "None";
     return Json::writeString(builder, document);
 }
 
