@@ -99,6 +99,48 @@ TEST_F(DaemonChannelTest, DaemonThatHangsUpGivesFalseAndTheCallerSurvives)
     EXPECT_EQ(action.sa_handler, SIG_IGN) << "SIGPIPE stays ignored after the call";
 }
 
+// fileindex-standin-daemon, in both modes, ends at once on SIGTERM or SIGINT, taking its socket with
+// it, even when started with both signals blocked (a program that blocks them for its own threads
+// may start it so), and once its socket is gone (a sandbox rebuilt under it): none is left behind.
+TEST_F(DaemonChannelTest, TheStandInEndsOnASignalOrOnceItsSocketIsGone)
+{
+    const struct Row {
+        bool processQueues;
+        int signal;  // 0: the socket is removed instead
+        bool startedBlocked;
+    } rows[] = {
+        {false, SIGTERM, false}, {false, SIGINT, false}, {false, SIGTERM, true}, {false, 0, false},
+        {true, SIGTERM, false},  {true, SIGINT, true},   {true, 0, false},
+    };
+    for (const Row &row : rows) {
+        SCOPED_TRACE(std::string(row.processQueues ? "--process-queues, " : "") +
+                     (row.signal == 0 ? "socket removed" : strsignal(row.signal)) +
+                     (row.startedBlocked ? ", started blocked" : ""));
+        unlink(FILEINDEX_DAEMON_SOCKET_PATH);  // one a failed row left
+        Child standIn([&row](const Child::Ready &) {
+            sigset_t stop;
+            sigemptyset(&stop);
+            sigaddset(&stop, SIGTERM);
+            sigaddset(&stop, SIGINT);
+            sigprocmask(row.startedBlocked ? SIG_BLOCK : SIG_UNBLOCK, &stop, nullptr);
+            execl(FILEINDEX_STANDIN_DAEMON, FILEINDEX_STANDIN_DAEMON, "--output", "/dev/null",
+                  row.processQueues ? "--process-queues" : nullptr, nullptr);
+            _exit(127);
+        });
+        for (int i = 0; i < 500 && access(FILEINDEX_DAEMON_SOCKET_PATH, F_OK) != 0; ++i) {
+            usleep(10000);
+        }
+        ASSERT_EQ(access(FILEINDEX_DAEMON_SOCKET_PATH, F_OK), 0) << "the stand-in did not listen";
+        if (row.signal != 0) {
+            standIn.Kill(row.signal);
+        } else {
+            unlink(FILEINDEX_DAEMON_SOCKET_PATH);
+        }
+        EXPECT_EQ(standIn.WaitFor(std::chrono::seconds(1)), 0);
+        EXPECT_NE(access(FILEINDEX_DAEMON_SOCKET_PATH, F_OK), 0);
+    }
+}
+
 class EventQueueTest : public SandboxTest {
 protected:
     void SetUp() override

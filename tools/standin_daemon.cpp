@@ -2,8 +2,8 @@
 // line per command received, the command's JSON text exactly as it arrived, to a file or to
 // standard output. A frame that breaks the framing rules is written as {"malformed": reason}.
 // With --process-queues it also works through the shares' event queues as fileindexd would
-// (standin_queue_worker.h), so that indexing progress moves on to "finished", and it ends once its
-// socket is gone.
+// (standin_queue_worker.h), so that indexing progress moves on to "finished". It ends on SIGTERM or
+// SIGINT, whatever it is doing and whatever signal mask it inherited, and once its socket is gone.
 //
 // Frame: a 4-byte length in host byte order counting the terminating NUL, the JSON text, the NUL.
 // One frame per connection. The socket appears only once it accepts connections, so a program
@@ -33,7 +33,8 @@
 
 namespace {
 
-// How often the queue worker looks for work while no command arrives.
+// How often the stand-in looks at its socket, and the queue worker for work, while no command
+// arrives.
 constexpr int kStepMilliseconds = 50;
 
 volatile sig_atomic_t g_stop = 0;
@@ -112,10 +113,12 @@ std::string ReadFrame(int fd)
     return payload;
 }
 
+// The listening socket, non-blocking: a connection that goes away between the wait and accept4
+// must not leave the stand-in blocked there, deaf to signals.
 int Listen(const std::string &socketPath)
 {
     const std::string staging = socketPath + ".staging";
-    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const int fd = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
     sockaddr_un address = {};
     address.sun_family = AF_UNIX;
     if (fd < 0 || staging.size() >= sizeof(address.sun_path)) {
@@ -161,11 +164,22 @@ int main(int argc, char **argv)
         return app.exit(error) == 0 ? 0 : 2;  // a wrong command line is status 2, as for fileindexctl
     }
 
+    // SIGTERM and SIGINT are blocked except while the stand-in waits for a connection, which ppoll
+    // unblocks them for atomically: a signal that comes at any other moment ends the next wait
+    // instead of being taken between the check of g_stop and a blocking call, and a mask inherited
+    // with them blocked does not keep them out.
     struct sigaction action = {};
     action.sa_handler = OnSignal;
     sigaction(SIGTERM, &action, nullptr);
     sigaction(SIGINT, &action, nullptr);
     signal(SIGPIPE, SIG_IGN);
+    sigset_t stopSignals, waiting;
+    sigemptyset(&stopSignals);
+    sigaddset(&stopSignals, SIGTERM);
+    sigaddset(&stopSignals, SIGINT);
+    sigprocmask(SIG_BLOCK, &stopSignals, &waiting);
+    sigdelset(&waiting, SIGTERM);
+    sigdelset(&waiting, SIGINT);
 
     const int output = outputPath.empty()
                            ? STDOUT_FILENO
@@ -179,23 +193,21 @@ int main(int argc, char **argv)
         std::cerr << "cannot listen on " << socketPath << ": " << strerror(errno) << "\n";
         return 1;
     }
-    // Working through queues, the stand-in ends once its socket is gone or replaced (a sandbox
-    // rebuilt under it), so that it never takes the queues of a later appliance.
+    // The stand-in ends once its socket is gone or replaced (a sandbox rebuilt under it), so that
+    // none is left behind unreachable, and none takes the queues of a later appliance.
     struct stat listening;
     if (stat(socketPath.c_str(), &listening) != 0) {
         return 1;
     }
     fileindex_standin::QueueWorker worker{std::chrono::milliseconds(recordMilliseconds)};
-    for (int received = 0; !g_stop && (count == 0 || received < count);) {
+    const timespec step = {0, kStepMilliseconds * 1000000L};
+    for (int received = 0; !g_stop && (count == 0 || received < count) && IsSameFile(socketPath, listening);) {
         if (processQueues) {
-            if (!IsSameFile(socketPath, listening)) {
-                break;
-            }
             worker.Step();
-            pollfd waiting = {listener, POLLIN, 0};
-            if (poll(&waiting, 1, kStepMilliseconds) <= 0) {
-                continue;
-            }
+        }
+        pollfd incoming = {listener, POLLIN, 0};
+        if (ppoll(&incoming, 1, &step, &waiting) <= 0) {
+            continue;
         }
         const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
         if (connection < 0) {

@@ -52,6 +52,22 @@ int Child::Wait()
     return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
 }
 
+int Child::WaitFor(std::chrono::milliseconds limit)
+{
+    const auto deadline = std::chrono::steady_clock::now() + limit;
+    for (;;) {
+        siginfo_t info = {};
+        const int looked = waitid(P_PID, static_cast<id_t>(m_pid), &info, WEXITED | WNOHANG | WNOWAIT);
+        if (looked == 0 && info.si_pid == m_pid) {
+            return Wait();  // it has ended, and is reaped now
+        }
+        if ((looked != 0 && errno != EINTR) || std::chrono::steady_clock::now() >= deadline) {
+            return -1;
+        }
+        usleep(5000);
+    }
+}
+
 void Child::Kill(int signal)
 {
     kill(m_pid, signal);

@@ -5,6 +5,7 @@
 
 #include <sys/types.h>
 
+#include <chrono>
 #include <functional>
 #include <string>
 
@@ -22,6 +23,8 @@ public:
 
     // Waits for the child to end; its exit status, or 128 + signal.
     int Wait();
+    // The same, but waits at most limit: -1 when the child still runs then.
+    int WaitFor(std::chrono::milliseconds limit);
     void Kill(int signal);
 
 private:
