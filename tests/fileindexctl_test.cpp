@@ -387,7 +387,8 @@ TEST_F(FileindexctlTest, CompletionOffersWhatTheToolAndTheApplianceKnow)
 
 // A busy lock is not a failure. The commands whose lock comes before any effect try again until the
 // holder lets go; with --wait 0 they give up at once, exit 75 naming the holder, and leave folder.conf,
-// status.conf and the platform as they were.
+// status.conf and the platform as they were. A lock file that cannot be created is no busy lock:
+// told to wait an hour, they fail at once, naming the file, why and what to do, and change nothing.
 TEST_F(FileindexctlTest, ABusyLockIsWaitedForOrNamedAndLeavesNothingBehind)
 {
     FrameListener daemon;
@@ -433,6 +434,25 @@ TEST_F(FileindexctlTest, ABusyLockIsWaitedForOrNamedAndLeavesNothingBehind)
         });
         const Outcome waited = Ctl(row.args);
         EXPECT_EQ(waited.status, 0) << waited.err;
+
+        WriteFile(kFolderConf, folderConf);
+        WriteFile(FILEINDEX_STATUS_CONF_PATH, statusConf);
+        const size_t journalBefore = Journal().size();
+        const stdfs::path lockDirectory = stdfs::path(row.lock).parent_path();
+        stdfs::remove_all(lockDirectory);
+        std::vector<std::string> args = row.args;
+        args.insert(args.end(), {"--wait", "3600"});
+        const Outcome unusable = Ctl(args);
+        stdfs::create_directory(lockDirectory);
+        EXPECT_EQ(unusable.status, 1);
+        EXPECT_NE(unusable.err.find(std::string(" lock file ") + row.lock + " cannot be opened or created, so no "
+                                    "process holds it: the directory " + lockDirectory.string() +
+                                    " is missing (No such file or directory); create it, "),
+                  std::string::npos)
+            << unusable.err;
+        EXPECT_EQ(ReadFile(kFolderConf), folderConf);
+        EXPECT_EQ(ReadFile(FILEINDEX_STATUS_CONF_PATH), statusConf);
+        EXPECT_EQ(Journal().size(), journalBefore);
     }
 }
 

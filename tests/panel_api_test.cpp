@@ -273,7 +273,8 @@ TEST_F(PanelApiTest, EachChangeAnswersAndLeavesTheFilesItShould)
 
 // Another process holds the folder list's or the status file's lock for longer than the panel's own
 // retries: every writer answers 503 with Retry-After and writes nothing, and the page can tell busy
-// from failed by the error's name.
+// from failed by the error's name. Lock files that cannot be created are no busy lock: 422 at once,
+// naming them.
 TEST_F(PanelApiTest, ALockHeldByAnotherProcessIsBusyAndWritesNothing)
 {
     const std::string folders = R"({"/photo/holiday":{"path":"/photo/holiday","name":"H","photo":true}})";
@@ -302,6 +303,17 @@ TEST_F(PanelApiTest, ALockHeldByAnotherProcessIsBusyAndWritesNothing)
         EXPECT_EQ(answer.status, 503);
         EXPECT_EQ(answer.headers.find("Retry-After")->second, "1");
         EXPECT_TRUE(std::regex_search(answer.body, std::regex("\"code\":9,.*\"name\":\"FILEIDX_ERR_LOCK\"")))
+            << answer.body;
+    }
+    stdfs::remove_all(stdfs::path(FILEINDEX_FOLDER_LOCK_PATH).parent_path());
+    for (const Row &row : rows) {
+        SCOPED_TRACE(row.target + " without the lock files' directory");
+        const Answer answer = Ask("POST", row.target, row.body);
+        EXPECT_EQ(answer.status, 422);
+        EXPECT_NE(answer.body.find(std::string("the folder list lock file ") + FILEINDEX_FOLDER_LOCK_PATH +
+                                   " and the status lock file " + FILEINDEX_STATUS_LOCK_PATH +
+                                   " cannot be opened or created, so no process holds them: the directory "),
+                  std::string::npos)
             << answer.body;
     }
     EXPECT_EQ(ReadFile(kFolderConf), folders);

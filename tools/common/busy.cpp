@@ -1,12 +1,16 @@
-// Who holds a busy configuration lock, the wait for its release, and the failure when it stays busy.
+// Who holds a busy configuration lock, the wait for its release, the failure when it stays busy, and a
+// lock file that cannot be opened.
 #include "busy.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <chrono>
+#include <cstring>
 #include <fstream>
 #include <random>
 #include <sstream>
@@ -49,6 +53,13 @@ long FindLockPid(dev_t device, ino_t inode)
     return -1;
 }
 
+// The directory part of a path: "/a" for "/a/b", "/" for "/b".
+std::string DirectoryOf(const std::string &path)
+{
+    const size_t slash = path.rfind('/');
+    return slash == std::string::npos ? "." : path.substr(0, slash == 0 ? 1 : slash);
+}
+
 }  // namespace
 
 std::string LockHolder(const std::string &lockPath)
@@ -66,16 +77,6 @@ std::string LockHolder(const std::string &lockPath)
     std::getline(commFile, command);
     const std::string holder = "pid " + std::to_string(pid);
     return command.empty() ? holder : holder + " (" + TerminalText(command) + ")";
-}
-
-bool RetryWhileBusy(double waitSeconds, const std::function<bool()> &call)
-{
-    return RetryWhileBusy(waitSeconds, [&call](bool &busy) {
-        ClearLastError();
-        const bool done = call();
-        busy = !done && ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK;
-        return done;
-    });
 }
 
 bool RetryWhileBusy(double waitSeconds, const std::function<bool(bool &busy)> &attempt)
@@ -102,6 +103,61 @@ bool RetryWhileBusy(double waitSeconds, const std::function<bool(bool &busy)> &a
         std::this_thread::sleep_for(sleep);
         backOff = std::min(backOff * 2, std::chrono::milliseconds(250));
     }
+}
+
+bool LockFileUnusable(const std::string &what, const LockFile *lock, Failure &failure)
+{
+    std::string files;  // "the folder list lock file <path>", and " and the status lock file <path>"
+    int unusable = 0;
+    int error = 0;
+    const LockFile *first = nullptr;
+    for (const LockFile *candidate : {&kFolderListLock, &kStatusLock}) {
+        if (lock != nullptr && candidate != lock) {
+            continue;
+        }
+        const int fd = open(candidate->path, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644);
+        if (fd >= 0) {
+            close(fd);
+            continue;
+        }
+        if (first == nullptr) {
+            first = candidate;
+            error = errno;
+        }
+        files += std::string(unusable++ == 0 ? "" : " and ") + candidate->what + " file " + TerminalText(candidate->path);
+    }
+    if (first == nullptr) {
+        return false;
+    }
+    const std::string directory = TerminalText(DirectoryOf(first->path));
+    std::string cause, remedy;
+    switch (error) {
+    case ENOENT:
+        cause = "the directory " + directory + " is missing";
+        remedy = "create it, writable by the programs that use the file index";
+        break;
+    case EACCES:
+    case EPERM:
+        cause = "this account may not open or create files in " + directory;
+        remedy = "run as an account that may, or correct the permissions";
+        break;
+    case ELOOP:
+        cause = "a symbolic link stands at " + TerminalText(first->path) + ", and the library never follows one there";
+        remedy = "remove the link";
+        break;
+    case EROFS:
+        cause = "the file system of " + directory + " is read-only";
+        remedy = "make it writable";
+        break;
+    default:
+        cause = "the system refuses it";
+        remedy = "check " + directory;
+        break;
+    }
+    failure = ToolFailure(FailureKind::kFailed, VEXO::FILEINDEX::FILEIDX_ERR_LOCK,
+                          what + ": " + files + " cannot be opened or created, so no process holds " +
+                              (unusable == 1 ? "it: " : "them: ") + cause + " (" + strerror(error) + "); " + remedy);
+    return true;
 }
 
 Failure BusyFailure(const std::string &what, const LockFile &lock, double waitSeconds)

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <iterator>
 
+#include "busy.h"
 #include "fileindex/error.h"
 
 namespace fileindex_tool {
@@ -69,6 +70,10 @@ Failure LibraryFailure(const std::string &what, const std::string &withoutCode)
         return ToolFailure(FailureKind::kFailed, code,
                            what + ": the library reported error code " + std::to_string(code) +
                                ", which this program does not know; the system log has the library's line");
+    }
+    Failure unusable;
+    if (code == VEXO::FILEINDEX::FILEIDX_ERR_LOCK && LockFileUnusable(what, nullptr, unusable)) {
+        return unusable;
     }
     return ToolFailure(text->kind, code, what + ": " + text->meaning + "; " + text->advice);
 }

@@ -38,7 +38,8 @@ const char *ErrorCodeName(int code);
 
 // The failure of a library call that returned false, read from the library's last error (clear it
 // with ClearLastError before the call): "<what>: <meaning>; <advice>", of the kind the code implies
-// (9 busy, 2 and 4 not found, others failed). When the library recorded no code, the message is
+// (9 busy, 2 and 4 not found, others failed); 9 for a lock file that cannot be opened or created
+// is the ordinary failure of LockFileUnusable (busy.h). When the library recorded no code, the message is
 // "<what>: <withoutCode>" and the failure is of kind kFailed without a code: withoutCode says what
 // the caller knows (which steps set no code, what to look at).
 Failure LibraryFailure(const std::string &what, const std::string &withoutCode);

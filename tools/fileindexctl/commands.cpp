@@ -74,17 +74,28 @@ bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, co
                 const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
                 const char *daemonState)
 {
-    if (fileindex_tool::RetryWhileBusy(lock == nullptr ? 0 : context.wait, call)) {
-        return true;
-    }
-    if (lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
+    using fileindex_tool::FailureKind;
+    bool busyAtLast = false;
+    const bool done = fileindex_tool::RetryWhileBusy(lock == nullptr ? 0 : context.wait, [&](bool &busy) {
+        fileindex_tool::ClearLastError();
+        if (call()) {
+            return true;
+        }
+        // The operation's own lock failed: held by another process, or its file cannot be opened.
+        if (lock != nullptr && VEXO::FILEINDEX::ErrorHandler::GetError() == VEXO::FILEINDEX::FILEIDX_ERR_LOCK) {
+            busy = !fileindex_tool::LockFileUnusable(what, lock, failure);
+        } else {
+            failure = daemonState != nullptr ? fileindex_tool::DaemonFailure(what, daemonState, withoutCode)
+                                             : fileindex_tool::LibraryFailure(what, withoutCode);
+            busy = failure.kind == FailureKind::kBusy;
+        }
+        busyAtLast = busy;
+        return false;
+    });
+    if (!done && lock != nullptr && busyAtLast) {
         failure = fileindex_tool::BusyFailure(what, *lock, context.wait);
-    } else if (daemonState != nullptr) {
-        failure = fileindex_tool::DaemonFailure(what, daemonState, withoutCode);
-    } else {
-        failure = fileindex_tool::LibraryFailure(what, withoutCode);
     }
-    return false;
+    return done;
 }
 
 bool Confirmed(const Context &context, const std::string &what, const std::string &question,

@@ -44,7 +44,8 @@ void AddWaitOption(CLI::App &command, Context &context, const std::string &descr
 // nothing behind; null for an operation that takes none of its own, or may have done part of its
 // work when it meets one: it runs once. On failure, failure is BusyFailure when the lock stayed busy;
 // for an operation that tells fileindexd (daemonState not null: what stands when fileindexd was not
-// told, "" for nothing to say), DaemonFailure; otherwise LibraryFailure(what, withoutCode).
+// told, "" for nothing to say), DaemonFailure; otherwise LibraryFailure(what, withoutCode), which
+// also tells, at the first attempt, a lock file that cannot be opened or created from a busy lock.
 bool RunWaiting(const Context &context, const fileindex_tool::LockFile *lock, const std::string &what,
                 const std::string &withoutCode, const std::function<bool()> &call, fileindex_tool::Failure &failure,
                 const char *daemonState = nullptr);
