@@ -26,13 +26,10 @@ if [ ${#commands[@]} -eq 0 ]; then
     exit 1
 fi
 
-stop_standin() {
-    local pid
-    pid=$(sed -n 's/.*"fileindexd":{[^}]*"pid":\([0-9]*\).*/\1/p' "$root/emulation/services.json" 2>/dev/null || true)
-    if [ -n "$pid" ] && grep -qs fileindex-standin-daemon "/proc/$pid/cmdline"; then
-        kill "$pid"
-    fi
-}
+# The demo's sandbox appliance, whose stop_standin ends the stand-in daemon.
+state=$root/emulation
+# shellcheck source=tools/sandbox_appliance.sh
+source tools/sandbox_appliance.sh
 trap stop_standin EXIT
 
 failed=0

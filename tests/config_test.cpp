@@ -3,7 +3,6 @@
 // library writes: the documents, the frames, the queue records.)
 #include <fcntl.h>
 #include <signal.h>
-#include <spawn.h>
 #include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
@@ -27,6 +26,7 @@
 #include "tests/support/child.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/sandbox.h"
+#include "tests/support/spawn.h"
 #include "tests/support/syscall_faults.h"
 
 using namespace VEXO::FILEINDEX;
@@ -132,9 +132,8 @@ TEST_F(ConfigTest, AProgramStartedWhileTheLockIsHeldDoesNotInheritIt)
     TestDoc doc;
     ASSERT_TRUE(doc.Lock(true));
     EXPECT_TRUE(fcntl(doc.LockFd(), F_GETFD) & FD_CLOEXEC);
-    pid_t pid;
-    const char *argv[] = {"/bin/sleep", "5", nullptr};
-    ASSERT_EQ(posix_spawn(&pid, argv[0], nullptr, nullptr, const_cast<char **>(argv), environ), 0);
+    const pid_t pid = SpawnProgram("/bin/sleep", {"5"}, {});
+    ASSERT_GT(pid, 0);
     doc.Unlock();
     const bool held = IsLockHeld(kLockPath);
     kill(pid, SIGKILL);

@@ -3,11 +3,9 @@
 #include <signal.h>
 #include <sys/file.h>
 #include <sys/ioctl.h>
-#include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cstring>
 #include <regex>
 #include <string>
 #include <vector>
@@ -17,6 +15,7 @@
 #include "tests/support/child.h"
 #include "tests/support/frame_listener.h"
 #include "tests/support/sandbox.h"
+#include "tests/support/spawn.h"
 
 namespace fileindex_test {
 namespace {
@@ -58,19 +57,6 @@ protected:
     static Outcome Ctl(const std::vector<std::string> &args, const Setting &setting = Setting())
     {
         const std::string out = HostPath("/ctl.out"), err = HostPath("/ctl.err");
-        std::vector<char *> argv{const_cast<char *>(FILEINDEXCTL)};
-        for (const std::string &arg : args) {
-            argv.push_back(const_cast<char *>(arg.c_str()));
-        }
-        argv.push_back(nullptr);
-        std::vector<std::string> variables{"TERM=" + setting.term};
-        std::vector<char *> envp{const_cast<char *>(variables[0].c_str())};
-        for (char **variable = environ; *variable != nullptr; ++variable) {
-            if (strncmp(*variable, "TERM=", 5) != 0) {
-                envp.push_back(*variable);
-            }
-        }
-        envp.push_back(nullptr);
         int terminal = -1;
         if (setting.terminal) {
             terminal = posix_openpt(O_RDWR | O_NOCTTY | O_NONBLOCK);
@@ -78,16 +64,14 @@ protected:
             EXPECT_TRUE(terminal >= 0 && grantpt(terminal) == 0 && unlockpt(terminal) == 0 &&
                         ioctl(terminal, TIOCSWINSZ, &size) == 0);
         }
-        posix_spawn_file_actions_t files;
-        posix_spawn_file_actions_init(&files);
-        posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, setting.terminal ? ptsname(terminal) : out.c_str(),
-                                         setting.terminal ? O_RDWR | O_NOCTTY : O_WRONLY | O_CREAT | O_TRUNC, 0644);
-        posix_spawn_file_actions_addopen(&files, STDERR_FILENO, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-        posix_spawn_file_actions_addopen(&files, STDIN_FILENO, setting.terminal ? ptsname(terminal) : "/dev/null",
-                                         setting.terminal ? O_RDWR | O_NOCTTY : O_RDONLY, 0);
-        pid_t pid = -1;
-        EXPECT_EQ(posix_spawn(&pid, FILEINDEXCTL, &files, nullptr, argv.data(), envp.data()), 0);
-        posix_spawn_file_actions_destroy(&files);
+        const std::string typed = setting.terminal ? ptsname(terminal) : "/dev/null";
+        const pid_t pid = SpawnProgram(
+            FILEINDEXCTL, args,
+            {Redirect::File(STDOUT_FILENO, setting.terminal ? typed : out,
+                            setting.terminal ? O_RDWR | O_NOCTTY : O_WRONLY | O_CREAT | O_TRUNC),
+             Redirect::File(STDERR_FILENO, err, O_WRONLY | O_CREAT | O_TRUNC),
+             Redirect::File(STDIN_FILENO, typed, setting.terminal ? O_RDWR | O_NOCTTY : O_RDONLY)},
+            {"TERM=" + setting.term});
         if (terminal >= 0) {
             EXPECT_EQ(write(terminal, setting.input.data(), setting.input.size()),
                       static_cast<ssize_t>(setting.input.size()));

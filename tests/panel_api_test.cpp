@@ -2,7 +2,6 @@
 // with the status code, the body and the appliance's files checked after every request.
 #include <fcntl.h>
 #include <signal.h>
-#include <spawn.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -19,6 +18,7 @@
 #include "tests/support/child.h"
 #include "tests/support/frame_listener.h"
 #include "tests/support/sandbox.h"
+#include "tests/support/spawn.h"
 
 namespace fileindex_test {
 namespace {
@@ -34,17 +34,9 @@ public:
     {
         int out[2];
         EXPECT_EQ(pipe2(out, O_CLOEXEC), 0);
-        std::vector<char *> argv{const_cast<char *>(FILEINDEX_PANEL)};
-        for (const std::string &arg : args) {
-            argv.push_back(const_cast<char *>(arg.c_str()));
-        }
-        argv.push_back(nullptr);
-        posix_spawn_file_actions_t files;
-        posix_spawn_file_actions_init(&files);
-        posix_spawn_file_actions_adddup2(&files, out[1], STDOUT_FILENO);
-        posix_spawn_file_actions_addopen(&files, STDERR_FILENO, errPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-        EXPECT_EQ(posix_spawn(&m_pid, FILEINDEX_PANEL, &files, nullptr, argv.data(), environ), 0);
-        posix_spawn_file_actions_destroy(&files);
+        m_pid = SpawnProgram(FILEINDEX_PANEL, args,
+                             {Redirect::Descriptor(STDOUT_FILENO, out[1]),
+                              Redirect::File(STDERR_FILENO, errPath, O_WRONLY | O_CREAT | O_TRUNC)});
         close(out[1]);
         // The URL line, or nothing when the panel refused to start.
         for (char c; read(out[0], &c, 1) == 1 && c != '\n';) {

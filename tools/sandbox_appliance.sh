@@ -1,7 +1,8 @@
-# The demo's sandbox appliance, for demo.sh and the panel's browser test (sourced by both). They set
-# root (the build's sandbox root), state (the emulated platform's state directory) and tools (the
-# directory of the build's programs) first; record_milliseconds, when set, is how long the stand-in
-# daemon takes for one queue record (300 ms otherwise).
+# The demo's sandbox appliance, for demo.sh, the panel's browser test and the README's explore check
+# (sourced by each). They set root (the build's sandbox root), state (the emulated platform's state
+# directory) and tools (the directory of the build's programs) first; record_milliseconds, when set,
+# is how long the stand-in daemon takes for one queue record (300 ms otherwise). The explore check
+# only stops the stand-in.
 
 # Ends the stand-in daemon that the emulated service start launched, if it still runs.
 stop_standin() {
