@@ -19,6 +19,7 @@
 #include "appliance_paths.h"
 #include "config/file_io.h"
 #include "config/json_io.h"
+#include "daemon/queue_record.h"
 #include "platform/service.h"
 #include "share/storage_paths.h"
 
@@ -193,6 +194,19 @@ size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::
 {
     std::ofstream out(path, std::ios::binary | std::ios::trunc);
     Sequence random;
+    // The library's own records, made by its record writer as AddCustomEvent makes them.
+    const auto libraryRecord = [](unsigned event, const std::string &recordPath, const Json::Value &data) {
+        std::string line;
+        if (!VEXO::FILEINDEX::MakeQueueRecordLine(event, recordPath, data, line)) {
+            Fail("cannot make a queue record of " + recordPath);
+        }
+        line.pop_back();
+        return line;
+    };
+    Json::Value changeReport(Json::objectValue);
+    for (const char *medium : {"document", "audio", "video", "photo"}) {
+        changeReport[medium] = std::string(medium) == "document";
+    }
     size_t size = 0;
     for (size_t i = 0; i < lines; ++i) {
         const std::string &folder = fullFolders[random.Next(static_cast<unsigned>(fullFolders.size()))];
@@ -205,10 +219,9 @@ size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::
         } else if (kind < 86) {
             line = "{\"event\":256,\"path\":\"" + folder + file + "\",\"path_old\":\"" + folder + "/old" + file + "\"}";
         } else if (kind < 95) {
-            line = "{\"event\":131072,\"path\":\"" + folder +
-                   "\",\"data\":{\"audio\":false,\"document\":true,\"photo\":false,\"video\":false}}";
+            line = libraryRecord(VEXO::FILEINDEX::kEventFolderSettingChanged, folder, changeReport);
         } else if (kind < 97) {
-            line = "{\"event\":65536,\"path\":\"" + folder + "/sub\"}";
+            line = libraryRecord(VEXO::FILEINDEX::kEventReindex, folder + "/sub", Json::Value());
         } else if (kind < 98) {
             line = "{\"event\":2,\"path\":\"" + folder + "\\/caf\\u00e9" + file + "\"}";
         } else if (kind < 99) {

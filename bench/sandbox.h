@@ -44,9 +44,11 @@ std::string FullPathOf(const std::string &folder);
 void WriteFolderConf(const std::vector<std::string> &folders);
 
 // Writes a queue file of lines records about files inside the given full paths of folders, in the
-// mix a busy share shows: file events, moves, folder-setting events with their change report,
-// reindex records of other paths, a few names written with escapes ("\u00e9", "\/") and a few with
-// bytes that are not UTF-8. Written as it is generated, never held in memory. Returns its size.
+// mix a busy share shows: file events and moves as the notification daemon writes them, the
+// library's own folder-setting events with their change report and reindex records of other paths
+// as its record writer makes them, a few names written with escapes ("\u00e9", "\/"), a few with
+// bytes that are not UTF-8 and a few records with their members in another order. Written as it is
+// generated, never held in memory. Returns its size.
 size_t WriteQueue(const std::string &path, size_t lines, const std::vector<std::string> &fullFolders);
 
 // How much a process's peak resident memory grows while run runs, in KiB (-1 when the system does
