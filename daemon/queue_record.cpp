@@ -55,11 +55,12 @@ public:
     // The record the members make; false when they make none.
     bool Fill(QueueRecord &record) const
     {
-        if (!m_isObject || !m_event.present || !ReadEvent(record.event) || !ReadString(m_path, record.path)) {
+        if (!m_isObject || !m_event.present || !ReadEvent(record.event) ||
+            !ReadString(m_path, record.decodedPath, record.path)) {
             return false;
         }
-        if (record.event != kEventMove || !ReadString(m_pathOld, record.pathOld)) {
-            record.pathOld.clear();
+        if (record.event != kEventMove || !ReadString(m_pathOld, record.decodedPathOld, record.pathOld)) {
+            record.pathOld = std::string_view();
         }
         return true;
     }
@@ -89,15 +90,17 @@ private:
         }
     }
 
-    static bool ReadString(const MemberText &member, std::string &out)
+    // The string's bytes: the text itself, or when it has escapes their decoding into decoded.
+    static bool ReadString(const MemberText &member, std::string &decoded, std::string_view &out)
     {
         if (!member.present || member.token != JsonToken::kString) {
             return false;
         }
         if (member.escaped) {
-            DecodeJsonString(member.begin, member.end, out);
+            DecodeJsonString(member.begin, member.end, decoded);
+            out = decoded;
         } else {
-            out.assign(member.begin, member.end);
+            out = std::string_view(member.begin, static_cast<size_t>(member.end - member.begin));
         }
         return true;
     }
@@ -111,6 +114,8 @@ private:
     MemberText *m_current = nullptr;
 };
 
+constexpr size_t kNone = std::string_view::npos;
+
 // Whether line holds text at pos, compared as a run of bytes of the text's fixed length.
 template <size_t N>
 bool HasAt(std::string_view line, size_t pos, const char (&text)[N])
@@ -118,28 +123,80 @@ bool HasAt(std::string_view line, size_t pos, const char (&text)[N])
     return line.size() >= pos + N - 1 && std::memcmp(line.data() + pos, text, N - 1) == 0;
 }
 
+bool HasAt(std::string_view line, size_t pos, char c)
+{
+    return pos < line.size() && line[pos] == c;
+}
+
 // The end of a string's plain bytes that starts at begin: the position of its closing quote, or
-// npos when a backslash, a control character or the end of the line comes first.
+// kNone when a backslash, a control character or the end of the line comes first.
 size_t PlainStringEnd(std::string_view line, size_t begin)
 {
     const char *const end = line.data() + line.size();
     const char *const stop = SkipPlainStringBytes(line.data() + begin, end);
-    return stop != end && *stop == '"' ? static_cast<size_t>(stop - line.data()) : std::string_view::npos;
+    return stop != end && *stop == '"' ? static_cast<size_t>(stop - line.data()) : kNone;
 }
 
-// The compact shape of a file event, {"event":N,"path":"P"} with ,"path_old":"Q" before the brace
-// for a move, with no white space, no escape and no control character, and N a plain integer up to
-// 4294967295: judged without the grammar walk, with the walk's very result. False for any other
-// line, which may still be a record.
-bool ParsePlainRecord(std::string_view line, QueueRecord &record)
+// The "data" the library writes into its records, starting at pos: null, or an object of
+// booleans under plain names ({} included), without white space. The position after it; kNone for
+// any other value.
+size_t SkipWrittenData(std::string_view line, size_t pos)
+{
+    if (HasAt(line, pos, "null")) {
+        return pos + 4;
+    }
+    if (!HasAt(line, pos, '{')) {
+        return kNone;
+    }
+    if (HasAt(line, ++pos, '}')) {
+        return pos + 1;
+    }
+    for (;;) {
+        const size_t nameEnd = HasAt(line, pos, '"') ? PlainStringEnd(line, pos + 1) : kNone;
+        if (nameEnd == kNone || !HasAt(line, nameEnd + 1, ':')) {
+            return kNone;
+        }
+        pos = nameEnd + 2;
+        if (HasAt(line, pos, "true")) {
+            pos += 4;
+        } else if (HasAt(line, pos, "false")) {
+            pos += 5;
+        } else {
+            return kNone;
+        }
+        if (HasAt(line, pos, '}')) {
+            return pos + 1;
+        }
+        if (!HasAt(line, pos++, ',')) {
+            return kNone;
+        }
+    }
+}
+
+// The shapes the writers give their lines, with no white space, no escape and no control
+// character, and N a plain integer up to 4294967295: a file event's {"event":N,"path":"P"}, with
+// ,"path_old":"Q" before the brace for a move, and the library's own {"data":D,"event":N,"path":"P"}
+// (SkipWrittenData). Judged without the grammar walk, with the walk's very result. False for any
+// other line, which may still be a record.
+bool ParseWrittenShape(std::string_view line, QueueRecord &record)
 {
     static const char kEvent[] = "{\"event\":";
+    static const char kData[] = "{\"data\":";
+    static const char kEventAfterData[] = ",\"event\":";
     static const char kPath[] = ",\"path\":\"";
     static const char kPathOld[] = ",\"path_old\":\"";
-    if (!HasAt(line, 0, kEvent)) {
+    size_t pos = 0;
+    if (HasAt(line, 0, kEvent)) {
+        pos = sizeof(kEvent) - 1;
+    } else if (HasAt(line, 0, kData)) {
+        pos = SkipWrittenData(line, sizeof(kData) - 1);
+        if (pos == kNone || !HasAt(line, pos, kEventAfterData)) {
+            return false;
+        }
+        pos += sizeof(kEventAfterData) - 1;
+    } else {
         return false;
     }
-    size_t pos = sizeof(kEvent) - 1;
     const size_t digits = pos;
     uint64_t event = 0;
     for (; pos < line.size() && line[pos] >= '0' && line[pos] <= '9' && pos - digits < 11; ++pos) {
@@ -152,7 +209,7 @@ bool ParsePlainRecord(std::string_view line, QueueRecord &record)
     }
     const size_t path = pos + sizeof(kPath) - 1;
     const size_t pathEnd = PlainStringEnd(line, path);
-    if (pathEnd == std::string_view::npos) {
+    if (pathEnd == kNone) {
         return false;
     }
     pos = pathEnd + 1;
@@ -161,7 +218,7 @@ bool ParsePlainRecord(std::string_view line, QueueRecord &record)
     if (HasAt(line, pos, kPathOld)) {
         pathOld = pos + sizeof(kPathOld) - 1;
         pathOldEnd = PlainStringEnd(line, pathOld);
-        if (pathOldEnd == std::string_view::npos) {
+        if (pathOldEnd == kNone) {
             return false;
         }
         pos = pathOldEnd + 1;
@@ -170,8 +227,8 @@ bool ParsePlainRecord(std::string_view line, QueueRecord &record)
         return false;
     }
     record.event = static_cast<unsigned>(event);
-    record.path.assign(line.data() + path, pathEnd - path);
-    record.pathOld.assign(line.data() + pathOld, record.event == kEventMove ? pathOldEnd - pathOld : 0);
+    record.path = line.substr(path, pathEnd - path);
+    record.pathOld = line.substr(pathOld, record.event == kEventMove ? pathOldEnd - pathOld : 0);
     return true;
 }
 
@@ -179,7 +236,7 @@ bool ParsePlainRecord(std::string_view line, QueueRecord &record)
 
 bool ParseQueueRecord(std::string_view line, QueueRecord &record)
 {
-    if (ParsePlainRecord(line, record)) {
+    if (ParseWrittenShape(line, record)) {
         return true;
     }
     RecordMembers members;
@@ -223,9 +280,11 @@ bool ParseQueueRecordAsJsonValue(std::string_view line, QueueRecord &record)
         return false;
     }
     record.event = event->asUInt();
-    record.path = path->asString();
+    record.decodedPath = path->asString();
+    record.path = record.decodedPath;
     const Json::Value *pathOld = record.event == kEventMove ? member("path_old") : nullptr;
-    record.pathOld = pathOld != nullptr && pathOld->isString() ? pathOld->asString() : std::string();
+    record.decodedPathOld = pathOld != nullptr && pathOld->isString() ? pathOld->asString() : std::string();
+    record.pathOld = record.decodedPathOld;
     return true;
 }
 

@@ -18,18 +18,28 @@ constexpr unsigned kEventMove = 0x100;
 constexpr unsigned kEventReindex = 0x10000;
 constexpr unsigned kEventFolderSettingChanged = 0x20000;
 
+// A record as read from one line. path and pathOld view the line's own bytes where its text holds
+// them as they are, and the record's decoded copies where it has escapes: they hold as long as both
+// the line and the record do, and a record is therefore never copied.
 struct QueueRecord {
+    QueueRecord() = default;
+    QueueRecord(const QueueRecord &) = delete;
+    QueueRecord &operator=(const QueueRecord &) = delete;
+
     unsigned event = 0;
-    std::string path;
-    std::string pathOld;  // "path_old" of a move when it is a string; empty otherwise
+    std::string_view path;
+    std::string_view pathOld;  // "path_old" of a move when it is a string; empty otherwise
+    std::string decodedPath;     // the bytes path views when its text has escapes
+    std::string decodedPathOld;  // the same for pathOld
 };
 
 // True when line is one JSON object (fromString) with an "event" the JSON library can convert to an
 // unsigned integer and a string "path"; record is then filled. False for anything else (a line
 // being appended, a foreign record), record unspecified. Reads the members straight from the
-// text, a file event's compact shape ({"event":N,"path":"P"}, plus "path_old" for a move) without
-// even walking the grammar, and hands the rare line whose judgement needs the JSON library to
-// ParseQueueRecordAsJsonValue.
+// text, and the shapes the writers give their lines without even walking the grammar: a file
+// event's {"event":N,"path":"P"} (plus "path_old" for a move) and the library's own
+// {"data":D,"event":N,"path":"P"} with D null or an object of booleans. Hands the rare line whose
+// judgement needs the JSON library to ParseQueueRecordAsJsonValue.
 bool ParseQueueRecord(std::string_view line, QueueRecord &record);
 
 // The same judgement made on the line's Json::Value.

@@ -1,8 +1,9 @@
 // One line of a share's event queue, as every scan of a queue judges it. Whatever the line holds,
 // the reader answers without crashing or throwing, and exactly as the JSON library's reading of the
-// line does. A line it accepts says the same when written again as a record, by hand and by the
-// library's own record writer, and the same line cut short anywhere, as a writer stopped
-// mid-append leaves it, is never taken for a record.
+// line does; and so it does for the line of the library's own shape with the input as its "data",
+// a shape the reader takes straight from its bytes. A line it accepts says the same when written
+// again as a record, by hand and by the library's own record writer, and the same line cut short
+// anywhere, as a writer stopped mid-append leaves it, is never taken for a record.
 #include <cstdlib>
 #include <string>
 
@@ -18,12 +19,24 @@ bool SameRecord(const QueueRecord &a, const QueueRecord &b)
     return a.event == b.event && a.path == b.path && a.pathOld == b.pathOld;
 }
 
+// Whether the reader takes line for a record (into record), after checking that the JSON library's
+// reading says the same, with the same record.
+bool ReadAlike(const std::string &line, QueueRecord &record)
+{
+    QueueRecord throughLibrary;
+    const bool accepted = ParseQueueRecord(line, record);
+    if (accepted != ParseQueueRecordAsJsonValue(line, throughLibrary) || (accepted && !SameRecord(record, throughLibrary))) {
+        abort();
+    }
+    return accepted;
+}
+
 std::string Rewritten(const QueueRecord &record)
 {
     Json::Value value(Json::objectValue);
     value["event"] = record.event;
-    value["path"] = record.path;
-    value["path_old"] = record.pathOld;
+    value["path"] = std::string(record.path);
+    value["path_old"] = std::string(record.pathOld);
     return toString(value);
 }
 
@@ -32,13 +45,10 @@ std::string Rewritten(const QueueRecord &record)
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
 {
     const std::string line(reinterpret_cast<const char *>(data), size);
+    QueueRecord asData;
+    ReadAlike("{\"data\":" + line + ",\"event\":131072,\"path\":\"/volume1/photo\"}", asData);
     QueueRecord record;
-    QueueRecord throughLibrary;
-    const bool accepted = ParseQueueRecord(line, record);
-    if (accepted != ParseQueueRecordAsJsonValue(line, throughLibrary) || (accepted && !SameRecord(record, throughLibrary))) {
-        abort();
-    }
-    if (!accepted) {
+    if (!ReadAlike(line, record)) {
         return 0;
     }
     QueueRecord again;
@@ -50,7 +60,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size)
     fromString(value, line);
     std::string appended;
     QueueRecord appendedBack;
-    if (!MakeQueueRecordLine(record.event, record.path, value["data"], appended) ||
+    if (!MakeQueueRecordLine(record.event, std::string(record.path), value["data"], appended) ||
         !ParseQueueRecord(appended, appendedBack) || appendedBack.event != record.event ||
         appendedBack.path != record.path) {
         abort();

@@ -58,7 +58,7 @@ private:
 };
 
 // path + "/" begins with folder + "/".
-bool IsInside(const std::string &path, std::string_view folder)
+bool IsInside(std::string_view path, std::string_view folder)
 {
     return path.size() >= folder.size() && path.compare(0, folder.size(), folder) == 0 &&
            (path.size() == folder.size() || path[folder.size()] == '/');
@@ -135,7 +135,7 @@ private:
         // events lie in folders that have had theirs, and are passed over without hashing a path.
         WaitingTails waitingTails(m_folders);
         QueueRecord record;
-        const auto mark = [&](const std::string &path) {
+        const auto mark = [&](std::string_view path) {
             for (const size_t length : m_lengths) {
                 if (length > path.size()) {
                     break;
