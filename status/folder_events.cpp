@@ -20,18 +20,24 @@ namespace {
 constexpr size_t kNoEvent = static_cast<size_t>(-1);
 constexpr size_t kMaxKeptMalformedBytes = 1024 * 1024;
 
-// The last eight bytes (or fewer) of [text, text + length), with the length mixed in.
+// The last eight bytes (or fewer) of [text, text + length), with the length mixed in. Eight bytes
+// are copied as one word, which the hash then reads without waiting for bytes stored one by one.
 uint64_t Tail(const char *text, size_t length)
 {
     uint64_t word = 0;
-    const size_t size = std::min<size_t>(length, sizeof(word));
-    std::memcpy(&word, text + length - size, size);
+    if (length >= sizeof(word)) {
+        std::memcpy(&word, text + length - sizeof(word), sizeof(word));
+    } else {
+        std::memcpy(&word, text, length);
+    }
     return word ^ (length * 0x9E3779B97F4A7C15ULL);
 }
 
 // Counts of the folders still waiting for their first event, by a hash of the Tail of their text
 // into at least sixteen buckets per folder: an event in a folder that has had its first one is
-// passed over after one look at its bucket, without hashing the whole path.
+// passed over after one look at its bucket, without hashing the whole path. The look is at one bit
+// per bucket (set while its count is not zero), so that it stays in the nearest cache: 2 KiB for
+// a thousand folders.
 class WaitingTails {
 public:
     explicit WaitingTails(const std::vector<std::string> &folders)
@@ -40,20 +46,34 @@ public:
             m_counts.resize(m_counts.size() * 2);
             --m_shift;
         }
+        m_waiting.resize((m_counts.size() + 63) / 64);
         for (const std::string &folder : folders) {
-            ++m_counts[Bucket(Tail(folder.data(), folder.size()))];
+            const size_t bucket = Bucket(Tail(folder.data(), folder.size()));
+            ++m_counts[bucket];
+            m_waiting[bucket / 64] |= uint64_t{1} << (bucket % 64);
         }
     }
 
     // False when no waiting folder has this tail; true when one may have.
-    bool AnyWaiting(uint64_t tail) const { return m_counts[Bucket(tail)] != 0; }
+    bool AnyWaiting(uint64_t tail) const
+    {
+        const size_t bucket = Bucket(tail);
+        return (m_waiting[bucket / 64] >> (bucket % 64) & 1) != 0;
+    }
     // A folder with this tail has had its first event.
-    void Settle(uint64_t tail) { --m_counts[Bucket(tail)]; }
+    void Settle(uint64_t tail)
+    {
+        const size_t bucket = Bucket(tail);
+        if (--m_counts[bucket] == 0) {
+            m_waiting[bucket / 64] &= ~(uint64_t{1} << (bucket % 64));
+        }
+    }
 
 private:
     size_t Bucket(uint64_t tail) const { return static_cast<size_t>((tail * 0x9E3779B97F4A7C15ULL) >> m_shift); }
 
     std::vector<uint32_t> m_counts = std::vector<uint32_t>(2);
+    std::vector<uint64_t> m_waiting;
     int m_shift = 63;
 };
 
