@@ -154,6 +154,8 @@ TEST_F(PanelApiTest, OnlyTheTokenHolderFromThePanelsOwnPageGetsIn)
         {"a foreign Host (DNS rebinding)", "GET", "/api/v1/status", "", Auth::kBearer, {{"Host", "attacker.example"}},
          403, "does not name this panel"},
         {"another port in Host", "GET", "/api/v1/status", "", Auth::kBearer, {{"Host", "127.0.0.1:1"}}, 403, ""},
+        {"a Host that is not UTF-8, quoted in the answer", "GET", "/api/v1/status", "", Auth::kBearer,
+         {{"Host", "caf\xe9.example\x7f"}}, 403, R"(the Host header \$'caf\\\\xe9\.example\\\\x7f' does not)"},
         {"localhost as Host", "GET", "/api/v1/status", "", Auth::kBearer,
          {{"Host", "localhost:" + std::to_string(m_panel->port)}}, 200, "\"status\":\"finished\""},
         {"a cross-site POST with the cookie", "POST", "/api/v1/folders", add, Auth::kCookie,

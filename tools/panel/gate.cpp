@@ -3,6 +3,7 @@
 
 #include <utility>
 
+#include "path_encoding.h"
 #include "replies.h"
 #include "token.h"
 
@@ -36,6 +37,15 @@ bool IsPage(const std::string &path)
     return path.compare(0, 5, "/api/") != 0;
 }
 
+// A Host header as a message shows it: in quotes, or, when it holds control characters or bytes
+// that are not UTF-8, quoted as a shell reads it back, so that the answer stays UTF-8 and no byte of
+// it can drive a terminal that prints it.
+std::string QuotedHost(const std::string &host)
+{
+    const std::string shown = fileindex_tool::TerminalText(host);
+    return shown == host ? "'" + host + "'" : shown;
+}
+
 }  // namespace
 
 Gate::Gate(std::string token, ListenAddress address) : m_token(std::move(token)), m_address(std::move(address)) {}
@@ -66,7 +76,7 @@ httplib::Server::HandlerResponse Gate::Check(const httplib::Request &request, ht
 {
     const std::string host = request.get_header_value("Host");
     if (!IsOwnHost(host, m_address)) {
-        Refuse(response, 403, "the Host header '" + host + "' does not name this panel; open it at http://" +
+        Refuse(response, 403, "the Host header " + QuotedHost(host) + " does not name this panel; open it at http://" +
                                    m_address.Authority() + "/");
         return httplib::Server::HandlerResponse::Handled;
     }
