@@ -255,7 +255,6 @@ TEST_F(StatusTest, CommandIsSentAfterTheSaveWhileTheStatusLockIsHeld)
     EXPECT_FALSE(IsLockHeld(kStatusLock));
 }
 
-// A writer that meets another's lock fails and tells the daemon nothing; readers take no lock.
 TEST_F(StatusTest, SpaceIsShortOnlyForAnUnknownShareOrADefiniteShortage)
 {
     // The quota test's answer 0 with its error: 0x2900 space short, 0x2400 quota short, others unsure.
