@@ -4,7 +4,6 @@
 #include "config/json_io.h"
 #include "config/log.h"
 #include "fileindex/error.h"
-#include "fileindex/status.h"
 #include "fileindex/utils.h"
 #include "folder/listing.h"
 #include "share/share_lookup.h"
