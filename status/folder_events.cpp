@@ -84,6 +84,22 @@ bool IsInside(std::string_view path, std::string_view folder)
            (path.size() == folder.size() || path[folder.size()] == '/');
 }
 
+// QueueReadings::FindEventInFolder of a file read for this one folder alone.
+bool SearchQueueFile(const std::string &queueFile, const std::string &folder,
+                     const std::function<void(std::string_view line)> &malformed, bool &found)
+{
+    found = false;
+    QueueRecord record;
+    return ForEachLine(queueFile, [&](std::string_view line) {
+        if (!ParseQueueRecord(line, record)) {
+            malformed(line);
+            return true;
+        }
+        found = IsInside(record.path, folder) || IsInside(record.pathOld, folder);
+        return !found;
+    });
+}
+
 }  // namespace
 
 // What one reading of a queue file found for the folders of a QueueReadings.
@@ -203,21 +219,6 @@ private:
     std::map<std::string, FileReading> m_files;
 };
 
-bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
-                       const std::function<void(std::string_view line)> &malformed, bool &found)
-{
-    found = false;
-    QueueRecord record;
-    return ForEachLine(queueFile, [&](std::string_view line) {
-        if (!ParseQueueRecord(line, record)) {
-            malformed(line);
-            return true;
-        }
-        found = IsInside(record.path, folder) || IsInside(record.pathOld, folder);
-        return !found;
-    });
-}
-
 QueueReadings::QueueReadings(Reuse reuse) : m_reuse(reuse) {}
 
 void QueueReadings::ReadOnceFor(std::vector<std::string> folders)
@@ -243,7 +244,7 @@ bool QueueReadings::FindEventInFolder(const std::string &queueFile, const std::s
     if (kept && m_readings->Answer(queueFile, folder, malformed, found)) {
         return true;
     }
-    return FILEINDEX::FindEventInFolder(queueFile, folder, malformed, found);
+    return SearchQueueFile(queueFile, folder, malformed, found);
 }
 
 }  // namespace FILEINDEX

@@ -15,14 +15,6 @@
 namespace VEXO {
 namespace FILEINDEX {
 
-// Searches queueFile for the first event on the folder (a full path) or inside it: an event whose
-// path, or for a move whose former path, with "/" appended begins with the folder with "/" appended.
-// Calls malformed, in file order, with every line before that event (every line, when there is
-// none) that is not a queue record. found tells whether there was one. False when the file cannot
-// be opened or read, errno telling why; the lines read up to then have been passed on.
-bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
-                       const std::function<void(std::string_view line)> &malformed, bool &found);
-
 // What one call has read of queue files. With Reuse::kOncePerCall, once told the full paths of the
 // folders the call will ask about, each queue file is read once, when the first of them asks about
 // it, and each of them is answered from that reading: all see the file as the reading found it, and
@@ -41,7 +33,12 @@ public:
     void ReadOnceFor(std::vector<std::string> folders);
     // IsFileExist(queueFile).
     bool Exists(const std::string &queueFile);
-    // FindEventInFolder(queueFile, folder, malformed, found).
+    // Searches queueFile for the first event on the folder (a full path) or inside it: an event
+    // whose path, or for a move whose former path, with "/" appended begins with the folder with
+    // "/" appended. Calls malformed, in file order, with every line before that event (every line,
+    // when there is none) that is not a queue record. found tells whether there was one. False when
+    // the file cannot be opened or read, errno telling why; the lines read up to then have been
+    // passed on.
     bool FindEventInFolder(const std::string &queueFile, const std::string &folder,
                            const std::function<void(std::string_view line)> &malformed, bool &found);
 
