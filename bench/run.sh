@@ -6,10 +6,11 @@
 #   bench/run.sh [repetitions]      (default 7; ./dev.sh bench runs this)
 #
 # Times are CPU times of the benchmark's thread, which the load of other processes on the machine
-# changes far less than wall-clock times; the upsert, which waits for the stand-in daemon, is
-# wall-clock time. A benchmark named <goal>/part:<name> measures a part of the others of its goal;
-# it is shown against the baseline but has no goal of its own, and it is the reference for their
-# memory.
+# changes far less than wall-clock times; the upsert, which waits for the stand-in daemon, and the
+# panel's listing (P6), answered in another process, are wall-clock times, and the panel's load run
+# (P7), run once, gives its own counts and latencies. A benchmark named <goal>/part:<name> measures
+# a part of the others of its goal; it is shown against the baseline but has no goal of its own, and
+# it is the reference for their memory.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 repetitions=${1:-7}
